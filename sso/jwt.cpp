@@ -1,0 +1,249 @@
+// The key is built from its modulus and exponent with the RSA calls that OpenSSL 3 deprecates.
+#define OPENSSL_API_COMPAT 0x10100000L
+
+#include "sso/jwt.h"
+
+#include <openssl/bio.h>
+#include <openssl/bn.h>
+#include <openssl/evp.h>
+#include <openssl/hmac.h>
+#include <openssl/rsa.h>
+#include <syslog.h>
+
+#include <algorithm>
+#include <cstring>
+#include <utility>
+
+#include "sso/json.h"
+#include "sso/owned.h"
+#include "sso/split.h"
+
+namespace QOVA {
+namespace JWT {
+
+namespace {
+
+using SSO::CText;
+using SSO::Releaser;
+
+constexpr char kUnit[] = "jwt.cpp";
+
+using BigNumber = std::unique_ptr<BIGNUM, Releaser<BN_free>>;
+using BioChain = std::unique_ptr<BIO, Releaser<BIO_free_all>>;
+using DigestContext = std::unique_ptr<EVP_MD_CTX, Releaser<EVP_MD_CTX_free>>;
+using PublicKey = std::unique_ptr<EVP_PKEY, Releaser<EVP_PKEY_free>>;
+using RSAKey = std::unique_ptr<RSA, Releaser<RSA_free>>;
+
+// A base64 filter in front of `memory`, which the chain takes over; null if either is missing.
+BioChain Base64Filter(BIO* memory) {
+  BioChain chain(memory);
+  if (chain == nullptr) return nullptr;
+  BIO* const filter = BIO_new(BIO_f_base64());
+  if (filter == nullptr) return nullptr;
+  BIO_set_flags(filter, BIO_FLAGS_BASE64_NO_NL);
+  return BioChain(BIO_push(filter, chain.release()));
+}
+
+// The text in the alphabet of standard base64, padded to whole groups of four. A text of 4k + 1
+// characters gets three pads; it stands for nothing and must not decode.
+std::string StandardBase64(const char* text, size_t length) {
+  std::string copy;
+  copy.reserve(length + 4);
+  copy.assign(text, length);
+  std::replace(copy.begin(), copy.end(), '-', '+');
+  std::replace(copy.begin(), copy.end(), '_', '/');
+  copy.append((4 - length % 4) % 4, '=');
+  return copy;
+}
+
+// Decodes base64url text (RFC 4648, section 5), padded or not. Returns a zero-terminated buffer of
+// malloc, its decoded length (0 or less for what is not base64) in `*length`; or null for an empty
+// text and for want of memory.
+char* Base64UrlDecode(const char* text, int* length) {
+  const size_t text_length = strlen(text);
+  const std::string copy = StandardBase64(text, text_length);
+  const BioChain chain = Base64Filter(BIO_new_mem_buf(copy.data(), static_cast<int>(copy.size())));
+  if (chain == nullptr) return nullptr;
+
+  const int pending = static_cast<int>(BIO_pending(chain.get()));
+  if (pending <= 0) return nullptr;
+  char* const buffer = static_cast<char*>(std::malloc(static_cast<size_t>(pending) + 1));
+  if (buffer == nullptr) return nullptr;
+
+  // OpenSSL's filter would read a byte out of one character and three pads.
+  const bool decodable = text_length % 4 != 1;
+  *length = decodable ? BIO_read(chain.get(), buffer, pending) : 0;
+  buffer[std::max(*length, 0)] = '\0';
+  return buffer;
+}
+
+// The bytes that a base64url text stands for.
+struct Bytes {
+  explicit Bytes(const std::string& text) : buffer(Base64UrlDecode(text.c_str(), &length)) {}
+
+  bool missing() const { return buffer == nullptr; }
+  const unsigned char* data() const { return reinterpret_cast<unsigned char*>(buffer.get()); }
+  int size() const { return std::max(length, 0); }
+
+ private:
+  int length = 0;
+  CText buffer;
+};
+
+// Decodes a segment and parses it, up to its first zero byte.
+Json::Value ParseSegment(const std::string& segment, const char* failure) {
+  const Bytes bytes(segment);
+  if (bytes.missing()) throw std::logic_error("basic_string: construction from null is not valid");
+  const char* const text = reinterpret_cast<const char*>(bytes.data());
+  Json::Value value;
+  if (!SSO::ParseJson(text, text + strlen(text), value)) throw std::invalid_argument(failure);
+  return value;
+}
+
+// The text that was signed: the two segments as they stand in the token.
+std::string SigningInput(const std::string& header, const std::string& body) {
+  std::string input;
+  input.reserve(header.size() + 1 + body.size());
+  input.append(header).append(1, '.').append(body);
+  input.resize(strlen(input.c_str()));
+  return input;
+}
+
+// An RSA key that owns both numbers; null if it cannot be made.
+RSAKey MakeRSAKey(const Bytes& modulus, const Bytes& exponent) {
+  BigNumber n(BN_bin2bn(modulus.data(), modulus.size(), nullptr));
+  BigNumber e(BN_bin2bn(exponent.data(), exponent.size(), nullptr));
+  if (n == nullptr || e == nullptr) return nullptr;
+  RSAKey key(RSA_new());
+  if (key == nullptr || RSA_set0_key(key.get(), n.get(), e.get(), nullptr) != 1) return nullptr;
+  n.release();
+  e.release();
+  return key;
+}
+
+PublicKey MakePublicKey(RSAKey rsa) {
+  PublicKey key(EVP_PKEY_new());
+  if (key == nullptr) return nullptr;
+  if (EVP_PKEY_assign(key.get(), EVP_PKEY_RSA, rsa.get()) != 1) {
+    syslog(LOG_ERR, "%s:%d EVP_PKEY_assign_RSA failed", kUnit, __LINE__);
+    return nullptr;
+  }
+  rsa.release();
+  if (EVP_PKEY_id(key.get()) != EVP_PKEY_RSA) {
+    syslog(LOG_ERR, "%s:%d check key type failed", kUnit, __LINE__);
+    return nullptr;
+  }
+  return key;
+}
+
+bool VerifyDigest(const std::string& input, const Bytes& signature, EVP_PKEY* key,
+                  const EVP_MD* md) {
+  const DigestContext context(EVP_MD_CTX_new());
+  if (context == nullptr) return false;
+  if (EVP_DigestVerifyInit(context.get(), nullptr, md, nullptr, key) != 1) {
+    syslog(LOG_ERR, "%s:%d EVP_DigestVerifyInit failed", kUnit, __LINE__);
+    return false;
+  }
+  if (EVP_DigestUpdate(context.get(), input.data(), input.size()) != 1) {
+    syslog(LOG_ERR, "%s:%d EVP_DigestVerifyUpdate failed", kUnit, __LINE__);
+    return false;
+  }
+  if (EVP_DigestVerifyFinal(context.get(), signature.data(),
+                            static_cast<size_t>(signature.size())) != 1) {
+    syslog(LOG_ERR, "%s:%d EVP_DigestVerifyFinal failed", kUnit, __LINE__);
+    return false;
+  }
+  return true;
+}
+
+bool VerifyRSA(const std::string& input, const std::string& n, const std::string& e,
+               const std::string& signature, const EVP_MD* md) {
+  const Bytes modulus(n);
+  const Bytes exponent(e);
+  const Bytes expected(signature);
+  if (modulus.missing() || exponent.missing() || expected.missing()) return false;
+  RSAKey rsa = MakeRSAKey(modulus, exponent);
+  if (rsa == nullptr) return false;
+  const PublicKey key = MakePublicKey(std::move(rsa));
+  return key != nullptr && VerifyDigest(input, expected, key.get(), md);
+}
+
+// Encodes bytes as base64url text without padding. False if that fails.
+bool Base64UrlEncode(const unsigned char* bytes, unsigned count, std::string& text) {
+  BIO* const memory = BIO_new(BIO_s_mem());
+  const BioChain chain = Base64Filter(memory);
+  if (chain == nullptr) return false;
+  if (BIO_write(chain.get(), bytes, static_cast<int>(count)) <= 0) return false;
+  if (BIO_flush(chain.get()) != 1) return false;
+  const int pending = static_cast<int>(BIO_pending(memory));
+  if (pending < 0) return false;
+  text.resize(static_cast<size_t>(pending) + 1);
+  text.resize(static_cast<size_t>(std::max(BIO_read(memory, &text[0], pending), 0)));
+
+  std::replace(text.begin(), text.end(), '/', '_');
+  std::replace(text.begin(), text.end(), '+', '-');
+  text.erase(std::remove(text.begin(), text.end(), '='), text.end());
+  return true;
+}
+
+bool VerifyHMAC(const std::string& input, const std::string& key_text, const std::string& signature,
+                const EVP_MD* md) {
+  const Bytes key(key_text);
+  // A text that decodes to nothing must not pass as the empty key.
+  if (key.missing() || key.size() == 0) return false;
+
+  unsigned char mac[EVP_MAX_MD_SIZE];
+  unsigned count = 0;
+  if (HMAC(md, key.data(), key.size(), reinterpret_cast<const unsigned char*>(input.data()),
+           input.size(), mac, &count) == nullptr) {
+    return false;
+  }
+  std::string expected;
+  return Base64UrlEncode(mac, count, expected) && strcmp(expected.c_str(), signature.c_str()) == 0;
+}
+
+}  // namespace
+
+jwt_exception::jwt_exception(const std::string& message) : std::runtime_error(message) {}
+jwt_exception::~jwt_exception() = default;
+
+jwt_not_support::jwt_not_support(const std::string& message) : jwt_exception(message) {}
+jwt_not_support::~jwt_not_support() = default;
+
+jwt_verify_failed::jwt_verify_failed(const std::string& message) : jwt_exception(message) {}
+jwt_verify_failed::~jwt_verify_failed() = default;
+
+Jwt::Jwt(std::string token) {
+  SSO::Pieces<3> segments;
+  if (!SSO::Split(token, ".", segments)) throw std::invalid_argument("bad jwt format!");
+  header.assign(segments[0].begin(), segments[0].end());
+  body.assign(segments[1].begin(), segments[1].end());
+  signature.assign(segments[2].begin(), segments[2].end());
+}
+
+Json::Value Jwt::GetHeader() {
+  return ParseSegment(header, "bad jwt header format!");
+}
+
+Json::Value Jwt::GetBody() {
+  return ParseSegment(body, "bad jwt body format!");
+}
+
+std::string Jwt::GetSignature() {
+  return signature;
+}
+
+void Jwt::JwtRSAVerify(std::string& n, std::string& e, const EVP_MD* md) {
+  if (!VerifyRSA(SigningInput(header, body), n, e, signature, md)) {
+    throw jwt_verify_failed("verify rsa signature failed");
+  }
+}
+
+void Jwt::JwtHMACVerify(std::string& key, const EVP_MD* md) {
+  if (!VerifyHMAC(SigningInput(header, body), key, signature, md)) {
+    throw jwt_verify_failed("verify hmac signature failed");
+  }
+}
+
+}  // namespace JWT
+}  // namespace QOVA

@@ -1,0 +1,177 @@
+#include "sso/sso.h"
+
+#include <syslog.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <new>
+#include <utility>
+
+#include "platform/platform.h"
+#include "sso/azuresso.h"
+#include "sso/http_body.h"
+#include "sso/json.h"
+#include "sso/utils.h"
+#include "sso/webspheresso.h"
+
+namespace QOVA {
+namespace SSO {
+
+namespace {
+
+constexpr char kUnit[] = "sso.cpp";
+
+// The name of the supported profile that single sign-on is switched on with.
+std::string EnabledProfile() {
+  Json::Value profile;
+  if (!ReadJsonFile(kProfilePath, profile)) throw sso_op_failed("read profile file failed.");
+
+  bool enable = false;
+  TakeSetting(profile, kEnableKey, enable);
+  if (!enable) throw sso_op_failed("sso does not enable.");
+
+  const Json::Value* const name = FindString(profile, kProfileKey);
+  if (name == nullptr) throw sso_op_failed("not specify sso profile");
+  for (const char* const supported : kSupportedProfiles) {
+    if (name->asString() == supported) return supported;
+  }
+  throw sso_exception("profile not support.");
+}
+
+// Finds the "origin" that the login program packed into a state; false if there is none.
+bool FindOrigin(const std::string& state, std::string& origin) {
+  char text[1024] = {};
+  size_t size = sizeof text;
+  if (QOVABase64Decode(state.data(), state.size(), text, &size) == 0) return false;
+
+  Json::Value parameters;
+  // A state that fills the buffer has no terminating zero in it.
+  if (!ParseJson(text, text + strnlen(text, sizeof text), parameters)) return false;
+  const Json::Value* const member = FindString(parameters, "origin");
+  if (member == nullptr) return false;
+  origin = member->asString();
+  return true;
+}
+
+}  // namespace
+
+SSOClient::SSOClient() = default;
+SSOClient::SSOClient(const SSOClient& other) = default;
+SSOClient::SSOClient(SSOClient&& other) noexcept = default;
+SSOClient& SSOClient::operator=(const SSOClient& other) = default;
+SSOClient& SSOClient::operator=(SSOClient&& other) noexcept = default;
+SSOClient::~SSOClient() = default;
+
+bool SSOClient::isEnable() {
+  return enable;
+}
+std::string SSOClient::GetClientID() {
+  return clientID;
+}
+std::string SSOClient::GetClientSecret() {
+  return clientSecret;
+}
+std::string SSOClient::GetRedirectURI() {
+  return redirectURI;
+}
+std::string SSOClient::GetToken() {
+  return token;
+}
+std::string SSOClient::GetAuthEndpoint() {
+  return authEndpoint;
+}
+std::string SSOClient::GetTokenEndpoint() {
+  return tokenEndpoint;
+}
+std::string SSOClient::GetWellknownEndpoint() {
+  return wellknownEndpoint;
+}
+std::string SSOClient::GetLogoutEndpoint() {
+  return logoutEndpoint;
+}
+
+void SSOClient::SetRedirectURI(std::string uri) {
+  redirectURI = std::move(uri);
+}
+
+void SSOClient::SetCode(std::string value) {
+  code = std::move(value);
+}
+
+void SSOClient::RequestWellknownInfo(Json::Value& out) {
+  try {
+    std::string response;
+    httpGet(wellknownEndpoint, response, true, WriteToStringCallback);
+    if (!ParseJson(response, out)) throw sso_err_resp("bad wellknown json format.");
+  } catch (const std::bad_alloc&) {
+    syslog(LOG_ERR, "%s:%d bad_alloc. %m", kUnit, __LINE__);
+  } catch (const std::invalid_argument& e) {
+    syslog(LOG_ERR, "%s:%d %s", kUnit, __LINE__, e.what());
+  } catch (const sso_err_resp& e) {
+    syslog(LOG_ERR, "%s:%d %s", kUnit, __LINE__, e.what());
+  }
+}
+
+void SSOClient::RequestTokenEndpoint(std::string& response, const std::string& params) {
+  try {
+    httpPost(tokenEndpoint, params, response, true, WriteToStringCallback);
+  } catch (const std::bad_alloc&) {
+    syslog(LOG_ERR, "%s:%d bad_alloc. %m", kUnit, __LINE__);
+  } catch (const std::invalid_argument& e) {
+    syslog(LOG_ERR, "%s:%d %s", kUnit, __LINE__, e.what());
+  } catch (const sso_err_resp& e) {
+    // "uri", but the text is the error's: administrators search their logs for this line.
+    syslog(LOG_ERR, "%s:%d request token uri %s.", kUnit, __LINE__, e.what());
+  }
+}
+
+void SSOClient::VerifyIDToken() {
+  throw sso_not_implemented("VerifyIDToken not implemented");
+}
+
+std::string SSOClient::GetIDTokenReqParams() {
+  throw sso_not_implemented("GetIDTokenReqParams not implemented");
+}
+
+void SSOClient::GetUserName(std::string&) {
+  throw sso_not_implemented("GetUserName not implemented");
+}
+
+void SSOClient::ProcessTokenResponse(std::string) {
+  throw sso_not_implemented("ProcessTokenResponse not implemented");
+}
+
+void SSOClient::OpenIDConnectLogin(std::string value, std::string& user) {
+  SetCode(std::move(value));
+  const std::string params = GetIDTokenReqParams();
+  std::string response;
+  RequestTokenEndpoint(response, params);
+  ProcessTokenResponse(std::move(response));
+  VerifyIDToken();
+  GetUserName(user);
+}
+
+void OIDCLogin(const std::string& code, std::string& user) {
+  const std::string profile = EnabledProfile();
+  if (profile == kAzureProfile) {
+    AzureSSOClient().OpenIDConnectLogin(code, user);
+  } else if (profile == kWebSphereProfile) {
+    WebSphereSSOClient().OpenIDConnectLogin(code, user);
+  } else {
+    std::abort();  // a profile was added to the list and not here
+  }
+}
+
+std::string GetSSORelayURL(bool success, const std::string& state, const std::string& reason) {
+  std::string url = "ssoclient/relay.html#";
+  std::string origin;
+  if (!success && !reason.empty()) {
+    url += "reason=" + reason + "&";
+  } else if (success && FindOrigin(state, origin)) {
+    url += "origin=" + URLEncode(origin) + "&";
+  }
+  return url += success ? "success=true" : "success=false";
+}
+
+}  // namespace SSO
+}  // namespace QOVA
