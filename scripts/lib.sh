@@ -18,14 +18,18 @@ die() {
 
 need_root() { [ "$(id -u)" -eq 0 ] || die "needs root (namespaces, set-id programs, apt)"; }
 
-# quietly LABEL COMMAND...: runs a long step with its output in a log file; shows that it
-# goes on (a dot every five seconds), and the end of the log when it fails.
+# quietly LABEL [--log FILE] COMMAND...: runs a long step with its output in a log file; shows
+# that it goes on (a dot every five seconds), and the end of the log when it fails.
 quietly() {
-  local label=$1 log pid rc=0 ticks=0
+  local label=$1 log= pid rc=0 ticks=0
   shift
-  log=$(mktemp)
+  if [ "$1" = --log ]; then
+    log=$2
+    shift 2
+  fi
+  local file=${log:-$(mktemp)}
   printf '[%4ds] %s ' "$((SECONDS - started))" "$label"
-  "$@" >"$log" 2>&1 &
+  ("$@") >"$file" 2>&1 &
   pid=$!
   while kill -0 "$pid" 2>/dev/null; do
     sleep 0.2
@@ -37,8 +41,8 @@ quietly() {
     printf ' done\n'
   else
     printf ' FAILED (status %d)\n' "$rc"
-    tail -n 60 "$log"
+    tail -n 60 "$file"
   fi
-  rm -f "$log"
+  [ -n "$log" ] || rm -f "$file"
   return "$rc"
 }
