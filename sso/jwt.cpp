@@ -116,8 +116,8 @@ RSAKey MakeRSAKey(const Bytes& modulus, const Bytes& exponent) {
   if (n == nullptr || e == nullptr) return nullptr;
   RSAKey key(RSA_new());
   if (key == nullptr || RSA_set0_key(key.get(), n.get(), e.get(), nullptr) != 1) return nullptr;
-  n.release();
-  e.release();
+  (void)n.release();  // the key's now
+  (void)e.release();
   return key;
 }
 
@@ -128,7 +128,7 @@ PublicKey MakePublicKey(RSAKey rsa) {
     syslog(LOG_ERR, "%s:%d EVP_PKEY_assign_RSA failed", kUnit, __LINE__);
     return nullptr;
   }
-  rsa.release();
+  (void)rsa.release();  // the key's now
   if (EVP_PKEY_id(key.get()) != EVP_PKEY_RSA) {
     syslog(LOG_ERR, "%s:%d check key type failed", kUnit, __LINE__);
     return nullptr;
