@@ -100,11 +100,13 @@ class Stage:
         with open("/proc/self/mountinfo", encoding="utf-8") as mounts:
             if " device-usr " not in mounts.read():
                 raise StageError("runs inside scripts/sandbox only")
-        run("mount", "-t", "tmpfs", "-o", "mode=755", "stage", "/run")
+        for folder in ("/run", "/var/cache"):
+            run("mount", "-t", "tmpfs", "-o", "mode=755", "stage", folder)
         os.makedirs(self.logs)
         self._private_dev()
+        self._private_etc()
         self.log = SystemLog()
-        self._names()
+        write("/etc/hosts", f"127.0.0.1 localhost {self._device_name} {self.provider_name}\n")
         self._authority()
 
     def _private_dev(self):
@@ -120,22 +122,18 @@ class Stage:
         run("mount", "--move", dev, "/dev")
         os.rmdir(dev)
 
-    def _names(self):
-        names = f"127.0.0.1 localhost {self._device_name} {self.provider_name}\n"
-        self._cover("/etc/hosts", names)
-
-    def _cover(self, path, text):
-        """Shows another text under a path of the host, inside this namespace only."""
-        cover = FOLDER + "/" + os.path.basename(path)
-        write(cover, text)
-        run("mount", "--bind", cover, path)
+    def _private_etc(self):
+        """A copy of /etc: names, authorities and the loader's cache are changed in it alone."""
+        run("cp", "-a", "/etc", FOLDER + "/etc")
+        run("mount", "--bind", FOLDER + "/etc", "/etc")
 
     def _authority(self):
         run("openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256",
             "-nodes", "-days", "30", "-subj", "/CN=ssoclient demo authority",
             "-keyout", FOLDER + "/ca.key", "-out", self.authority)
-        with open(BUNDLE, encoding="ascii") as system, open(self.authority, encoding="ascii") as own:
-            self._cover(BUNDLE, system.read() + own.read())
+        # libcurl looks nowhere else for authorities.
+        with open(self.authority, encoding="ascii") as own, open(BUNDLE, "a") as bundle:
+            bundle.write(own.read())
 
     def certificate(self, name):
         """Issues a certificate for a name; returns the paths of certificate and key."""
@@ -230,12 +228,11 @@ class Stage:
         os.chown(target, 0, pwd.getpwnam(WEB_USER).pw_gid)
         os.chmod(target, 0o4750)
 
-    def _loader(self):
+    @staticmethod
+    def _loader():
         """Makes the device's library folder known: a set-id program has no LD_LIBRARY_PATH."""
-        cache = FOLDER + "/ld.so.cache"
-        write(FOLDER + "/ld.so.conf", f"include /etc/ld.so.conf\n{QOVA}/lib\n")
-        run("ldconfig", "-X", "-f", FOLDER + "/ld.so.conf", "-C", cache)
-        run("mount", "--bind", cache, "/etc/ld.so.cache")
+        write("/etc/ld.so.conf.d/qova.conf", QOVA + "/lib\n")
+        run("ldconfig", "-X")
 
     def configure(self, name, values, mode=0o600):
         """Writes one of the device's three settings files."""
