@@ -1,0 +1,42 @@
+// A certificate authority that lives as long as the test.
+#pragma once
+
+#include <openssl/evp.h>
+#include <openssl/x509.h>
+
+#include <memory>
+#include <string>
+#include <vector>
+
+namespace test {
+
+// A certificate and its private key, as PEM text.
+struct Identity {
+  std::string certificate;
+  std::string key;
+};
+
+enum class Validity { kNow, kExpired, kNotYet };
+
+class Ca {
+ public:
+  Ca();
+
+  // A server certificate for these DNS names (an address as a name does not match).
+  Identity issue(const std::vector<std::string>& names, Validity validity = Validity::kNow) const;
+
+  // Makes libcurl trust this authority, in the sandbox alone: its bundle file is covered by a
+  // copy with this certificate appended. Throws outside a sandbox.
+  void trust() const;
+
+  std::string certificate() const;  // PEM
+
+ private:
+  std::shared_ptr<EVP_PKEY> key;
+  std::shared_ptr<X509> self;
+};
+
+// A server certificate that is its own issuer.
+Identity selfSigned(const std::vector<std::string>& names);
+
+}  // namespace test

@@ -1,0 +1,234 @@
+#include "support/device.h"
+
+#include <grp.h>
+#include <gtest/gtest.h>
+#include <sys/mman.h>
+#include <sys/mount.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstring>
+#include <fstream>
+#include <iostream>
+#include <sstream>
+#include <stdexcept>
+
+namespace test {
+namespace {
+
+[[noreturn]] void fail(const std::string& what) {
+  throw std::runtime_error(what + ": " + std::strerror(errno));
+}
+
+// A file without a name, on no file system.
+int newFile() {
+  const int file = memfd_create("test", 0);
+  if (file < 0) fail("memfd_create");
+  return file;
+}
+
+std::string contents(int file) {
+  std::string text;
+  char piece[4096];
+  for (ssize_t n; (n = pread(file, piece, sizeof piece, static_cast<off_t>(text.size()))) > 0;) {
+    text.append(piece, static_cast<std::size_t>(n));
+  }
+  return text;
+}
+
+void put(int file, const std::string& text) {
+  for (std::size_t done = 0; done < text.size();) {
+    const ssize_t n = write(file, text.data() + done, text.size() - done);
+    if (n <= 0) fail("write");
+    done += static_cast<std::size_t>(n);
+  }
+}
+
+void flushAll() {
+  std::cout.flush();
+  std::fflush(nullptr);
+}
+
+// What the child hands back: each part is its length, a line feed, and its bytes.
+void putPart(int file, const std::string& part) {
+  put(file, std::to_string(part.size()) + "\n" + part);
+}
+
+std::vector<std::string> partsOf(const std::string& text) {
+  std::vector<std::string> parts;
+  for (std::size_t at = 0; at < text.size();) {
+    const std::size_t line = text.find('\n', at);
+    const std::size_t size = std::stoul(text.substr(at, line - at));
+    parts.push_back(text.substr(line + 1, size));
+    at = line + 1 + size;
+  }
+  return parts;
+}
+
+void takeIds(Ids user, Ids group) {
+  if (setgroups(0, nullptr) != 0 || setresgid(group.real, group.effective, group.saved) != 0 ||
+      setresuid(user.real, user.effective, user.saved) != 0) {
+    fail("taking the ids");
+  }
+}
+
+std::string guarded(Ids user, Ids group, const std::function<std::string()>& body) {
+  try {
+    takeIds(user, group);
+    return body();
+  } catch (const std::exception& e) {
+    ADD_FAILURE() << "in the child process: " << e.what();
+  } catch (...) {
+    ADD_FAILURE() << "in the child process: an exception of another kind";
+  }
+  return "";
+}
+
+// Ends by exit() where that works, so that coverage counts are kept.
+[[noreturn]] void endChild() {
+  flushAll();
+#if !defined(__SANITIZE_ADDRESS__)
+  if (setresuid(0, 0, 0) == 0 && setresgid(0, 0, 0) == 0) exit(0);
+#endif
+  _exit(0);
+}
+
+[[noreturn]] void runChild(int report, Ids user, Ids group,
+                           const std::function<std::string()>& body) {
+  const testing::TestResult& result =
+      *testing::UnitTest::GetInstance()->current_test_info()->result();
+  const int before = result.total_part_count();
+  const std::string answer = guarded(user, group, body);
+  for (int i = before; i < result.total_part_count(); ++i) {
+    const testing::TestPartResult& part = result.GetTestPartResult(i);
+    if (!part.failed()) continue;
+    putPart(report, part.file_name() != nullptr ? part.file_name() : "");
+    putPart(report, std::to_string(part.line_number()));
+    putPart(report, part.message());
+  }
+  putPart(report, answer);
+  endChild();
+}
+
+}  // namespace
+
+void requireSandbox() {
+  std::ostringstream mounts;
+  mounts << std::ifstream("/proc/self/mounts").rdbuf();
+  if (mounts.str().find("device-usr /usr tmpfs") == std::string::npos) {
+    throw std::runtime_error("not in a sandbox: run this through scripts/sandbox");
+  }
+}
+
+std::string configPath(const std::string& name) {
+  return "/usr/qova/etc/ssoclient/" + name;
+}
+
+void writeConfig(const std::string& name, const std::string& text, mode_t mode, uid_t owner,
+                 gid_t group) {
+  requireSandbox();
+  const std::string path = configPath(name);
+  std::ofstream(path, std::ios::binary | std::ios::trunc) << text;
+  if (chown(path.c_str(), owner, group) != 0 || chmod(path.c_str(), mode) != 0) fail(path);
+}
+
+void removeConfig(const std::string& name) {
+  requireSandbox();
+  if (unlink(configPath(name).c_str()) != 0 && errno != ENOENT) fail(name);
+}
+
+void coverFile(const std::string& path, const std::string& text) {
+  requireSandbox();
+  static int count = 0;
+  const std::string cover = "/usr/qova/cover-" + std::to_string(++count);
+  std::ofstream(cover, std::ios::binary) << text;
+  if (mount(cover.c_str(), path.c_str(), nullptr, MS_BIND, nullptr) != 0) fail("cover " + path);
+}
+
+void resolveToLoopback(const std::string& host) {
+  std::ostringstream hosts;
+  hosts << std::ifstream("/etc/hosts").rdbuf();
+  coverFile("/etc/hosts", hosts.str() + "\n127.0.0.1 " + host + "\n");
+}
+
+std::string stdoutOf(const std::function<void()>& call) {
+  flushAll();
+  const int before = dup(1);
+  const int file = newFile();
+  dup2(file, 1);
+  const auto restore = [&] {
+    flushAll();
+    dup2(before, 1);
+    close(before);
+  };
+  try {
+    call();
+  } catch (...) {
+    restore();
+    close(file);
+    throw;
+  }
+  restore();
+  const std::string text = contents(file);
+  close(file);
+  return text;
+}
+
+CoutRecorder::CoutRecorder() : before(std::cout.rdbuf(this)) {}
+CoutRecorder::~CoutRecorder() {
+  std::cout.rdbuf(before);
+}
+
+std::streamsize CoutRecorder::xsputn(const char* text, std::streamsize count) {
+  writes.emplace_back(text, static_cast<std::size_t>(count));
+  return count;
+}
+
+CoutRecorder::int_type CoutRecorder::overflow(int_type c) {
+  if (c != traits_type::eof()) writes.emplace_back(1, traits_type::to_char_type(c));
+  return traits_type::not_eof(c);
+}
+
+int CoutRecorder::sync() {
+  ++flushes;
+  return 0;
+}
+
+std::string asProcess(Ids user, Ids group, const std::function<std::string()>& body) {
+  requireSandbox();
+  flushAll();
+  const int report = newFile();
+  const pid_t child = fork();
+  if (child < 0) fail("fork");
+  if (child == 0) runChild(report, user, group, body);
+  int status = 0;
+  while (waitpid(child, &status, 0) < 0 && errno == EINTR) {
+  }
+  const std::string text = contents(report);
+  close(report);
+  if (WIFSIGNALED(status)) {
+    ADD_FAILURE() << "the child process was ended by signal " << WTERMSIG(status);
+    return "";
+  }
+  const auto parts = partsOf(text);
+  if (parts.empty()) {
+    ADD_FAILURE() << "the child process ended with status " << WEXITSTATUS(status);
+    return "";
+  }
+  for (std::size_t i = 0; i + 3 <= parts.size() - 1; i += 3) {
+    ADD_FAILURE_AT(parts[i].c_str(), std::stoi(parts[i + 1])) << parts[i + 2];
+  }
+  EXPECT_EQ(WEXITSTATUS(status), 0);
+  return parts.back();
+}
+
+void asProcess(Ids both, const std::function<void()>& body) {
+  asProcess(both, both, [&] {
+    body();
+    return std::string();
+  });
+}
+
+}  // namespace test
