@@ -1,0 +1,252 @@
+// Splitting a compact token and reading its header and body.
+#include "sso/jwt.h"
+
+#include <gtest/gtest.h>
+#include <json/reader.h>
+#include <openssl/evp.h>
+
+#include <functional>
+#include <string>
+#include <typeinfo>
+#include <vector>
+
+namespace {
+
+using QOVA::JWT::Jwt;
+
+// Base64url without padding (RFC 7515, section 2).
+std::string Base64Url(const std::string& bytes) {
+  std::vector<unsigned char> text(bytes.size() * 2 + 8);
+  const int length =
+      EVP_EncodeBlock(text.data(), reinterpret_cast<const unsigned char*>(bytes.data()),
+                      static_cast<int>(bytes.size()));
+  std::string result(text.begin(), text.begin() + length);
+  result.resize(result.find_last_not_of('=') + 1);
+  for (char& c : result) c = c == '+' ? '-' : c == '/' ? '_' : c;
+  return result;
+}
+
+// The exception of exactly this type and text, or a failed test.
+template <typename Error>
+void ExpectThrows(const std::function<void()>& call, const std::string& message) {
+  try {
+    call();
+  } catch (const std::exception& e) {
+    EXPECT_TRUE(typeid(e) == typeid(Error)) << typeid(e).name() << ": " << e.what();
+    EXPECT_EQ(e.what(), message);
+    return;
+  }
+  ADD_FAILURE() << "nothing was thrown instead of: " << message;
+}
+
+// GetHeader and GetBody are one operation on two segments: what holds for one is tried on both.
+struct Part {
+  const char* name;
+  std::string (*token)(const std::string& segment);
+  Json::Value (Jwt::*get)();
+  const char* message;
+};
+
+const Part kParts[] = {
+    {"Header", [](const std::string& segment) { return segment + ".Ym9keQ.sig"; }, &Jwt::GetHeader,
+     "bad jwt header format!"},
+    {"Body", [](const std::string& segment) { return "aGVhZGVy." + segment + ".sig"; },
+     &Jwt::GetBody, "bad jwt body format!"},
+};
+
+void PrintTo(const Part& part, std::ostream* out) {
+  *out << part.name;
+}
+
+class JwtPart : public testing::TestWithParam<Part> {
+ protected:
+  static Json::Value Get(const std::string& segment) {
+    Jwt jwt(GetParam().token(segment));
+    return (jwt.*GetParam().get)();
+  }
+
+  static void ExpectRefused(const std::string& segment) {
+    SCOPED_TRACE(testing::PrintToString(segment));
+    ExpectThrows<std::invalid_argument>([&] { Get(segment); }, GetParam().message);
+  }
+};
+
+INSTANTIATE_TEST_SUITE_P(, JwtPart, testing::ValuesIn(kParts),
+                         [](const auto& part) { return std::string(part.param.name); });
+
+TEST(JwtSplit, TakesThreeSegmentsWhateverTheyHold) {
+  for (const char* token : {"a.b.c", "a..c", "..", "a.b.", ".b.c", "!.\xff.\n"}) {
+    SCOPED_TRACE(token);
+    EXPECT_NO_THROW(Jwt{token});
+  }
+}
+
+TEST(JwtSplit, RefusesAnyOtherNumberOfSegments) {
+  for (const char* token : {"", ".", "a", "a.b", "a.b.c.d", "...", "a..b.c", "a.b.c."}) {
+    SCOPED_TRACE(token);
+    ExpectThrows<std::invalid_argument>([&] { Jwt{token}; }, "bad jwt format!");
+  }
+}
+
+TEST(JwtSplit, CountsSegmentsBehindAZeroByteToo) {
+  const std::string three("a.b\0x.c", 7);
+  EXPECT_NO_THROW(Jwt{three});
+  const std::string four("a.b.c\0.d", 8);
+  ExpectThrows<std::invalid_argument>([&] { Jwt{four}; }, "bad jwt format!");
+}
+
+TEST(JwtSplit, LeavesTheSignatureSegmentAsItStands) {
+  for (const char* signature : {"", "-_-_", "a+/=", "not base64!", "x y"}) {
+    EXPECT_EQ(Jwt(std::string("a.b.") + signature).GetSignature(), signature);
+  }
+  const std::string zero("s\0t", 3);
+  EXPECT_EQ(Jwt("a.b." + zero).GetSignature(), zero);
+}
+
+TEST(JwtSplit, GivesCopiesOfTheSignature) {
+  Jwt jwt("a.b.c");
+  std::string copy = jwt.GetSignature();
+  copy += "changed";
+  EXPECT_EQ(jwt.GetSignature(), "c");
+}
+
+// RFC 7515, appendix A.1.1.
+TEST(JwtVector, OfTheStandardIsRead) {
+  Jwt jwt(
+      "eyJ0eXAiOiJKV1QiLA0KICJhbGciOiJIUzI1NiJ9."
+      "eyJpc3MiOiJqb2UiLA0KICJleHAiOjEzMDA4MTkzODAsDQogImh0dHA6Ly9leGFt"
+      "cGxlLmNvbS9pc19yb290Ijp0cnVlfQ.dBjftJeZ4CVP-mB92K27uhbUJU1p1r_wW1gFWFOEjXk");
+  const Json::Value header = jwt.GetHeader();
+  EXPECT_EQ(header["typ"], "JWT");
+  EXPECT_EQ(header["alg"], "HS256");
+  EXPECT_EQ(header.size(), 2u);
+  const Json::Value body = jwt.GetBody();
+  EXPECT_EQ(body["iss"], "joe");
+  EXPECT_EQ(body["exp"], 1300819380);
+  EXPECT_EQ(body["http://example.com/is_root"], true);
+  EXPECT_EQ(body.size(), 3u);
+  EXPECT_EQ(jwt.GetSignature(), "dBjftJeZ4CVP-mB92K27uhbUJU1p1r_wW1gFWFOEjXk");
+}
+
+TEST_P(JwtPart, IsReadTwiceAlike) {
+  Jwt jwt(GetParam().token(Base64Url(R"({"a":1})")));
+  const Json::Value first = (jwt.*GetParam().get)();
+  EXPECT_EQ((jwt.*GetParam().get)(), first);
+  EXPECT_EQ(first["a"], 1);
+}
+
+// Lengths 4k, 4k + 2 and 4k + 3, that is with no, two and one "=" to be appended.
+TEST_P(JwtPart, IsReadAtEveryLength) {
+  for (size_t length = 0; length <= 1200; ++length) {
+    const std::string text(length, 'x');
+    ASSERT_EQ(Get(Base64Url("{\"a\":\"" + text + "\"}"))["a"], text) << length;
+  }
+}
+
+TEST_P(JwtPart, OfOneCharacterMoreThanAFullGroupIsRefused) {
+  for (const char* text : {"", "123", R"({"a":123})", R"({"a":"xy"}  )", R"({"a":"xy", "b":23})"}) {
+    const std::string segment = Base64Url(text);
+    ASSERT_EQ(segment.size() % 4, 0u) << text;
+    for (const char* extra : {"A", "g", "0", "-", "_", "=", "!"}) ExpectRefused(segment + extra);
+  }
+}
+
+TEST_P(JwtPart, InStandardBase64IsReadAsWell) {
+  EXPECT_EQ(Get("eyJhIjoxfQ")["a"], 1);
+  EXPECT_EQ(Get("eyJhIjoxfQ==")["a"], 1);
+  EXPECT_EQ(Get("eyJhIjoxMn0")["a"], 12);
+  EXPECT_EQ(Get("eyJhIjoxMn0=")["a"], 12);
+  // "-" and "_", "+" and "/", and both kinds in one text.
+  const std::string text = "\"\xc3\xbb\xc3\xbf\xc3\xbe\xc3\xbf\xc3\xbe~?~?>>??\"";
+  std::string url = Base64Url(text);
+  ASSERT_NE(url.find('-'), std::string::npos) << url;
+  ASSERT_NE(url.find('_'), std::string::npos) << url;
+  std::string standard = url;
+  for (char& c : standard) c = c == '-' ? '+' : c == '_' ? '/' : c;
+  std::string mixed = url;
+  mixed[mixed.find('-')] = '+';
+  const std::string content = text.substr(1, text.size() - 2);
+  for (const std::string& segment : {url, standard, mixed})
+    EXPECT_EQ(Get(segment).asString(), content) << segment;
+}
+
+// Every pair of characters stands for one byte; what that is as JSON, the reader says.
+TEST_P(JwtPart, OfTwoCharactersIsTheByteTheyStandFor) {
+  const std::string alphabet = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789-_";
+  int read = 0;
+  for (size_t first = 0; first < 64; ++first) {
+    for (size_t second = 0; second < 64; ++second) {
+      const std::string segment = {alphabet[first], alphabet[second]};
+      const std::string byte(1, static_cast<char>(first << 2 | second >> 4));
+      Json::Value expected;
+      // What follows a zero byte is not part of the text.
+      if (!Json::Reader().parse(byte.c_str(), expected)) {
+        ASSERT_THROW(Get(segment), std::invalid_argument) << segment;
+        continue;
+      }
+      ASSERT_EQ(Get(segment), expected) << segment;
+      ++read;
+    }
+  }
+  EXPECT_GE(read, 10 * 16) << "each digit has 16 forms";
+}
+
+TEST_P(JwtPart, NeedNotBeAnObject) {
+  EXPECT_EQ(Get(Base64Url("null")), Json::Value());
+  EXPECT_EQ(Get(Base64Url("[]")), Json::Value(Json::arrayValue));
+  EXPECT_EQ(Get(Base64Url("[1,2]"))[1], 2);
+  EXPECT_EQ(Get(Base64Url("502")), 502);
+  EXPECT_EQ(Get(Base64Url("\"text\"")), "text");
+  EXPECT_EQ(Get(Base64Url("true")), true);
+}
+
+TEST_P(JwtPart, ThatIsNotJsonIsRefused) {
+  for (const char* text : {"{", "{\"a\":", "nul", "hello", "<html>", "\xff\xfe", "[1,", "\"open"})
+    ExpectRefused(Base64Url(text));
+}
+
+TEST_P(JwtPart, ThatIsNotBase64IsRefused) {
+  for (const char* segment :
+       {"!!!!", "!", "====", "=", "\xff\xff\xff\xff", "\n\n\n\n", "\n", "    "})
+    ExpectRefused(segment);
+}
+
+// Not one of the two messages: an absent text is not the same as a bad one.
+TEST_P(JwtPart, ThatIsEmptyIsALogicError) {
+  for (const std::string& segment : {std::string(), std::string("\0eyJhIjoxfQ", 11)}) {
+    try {
+      Get(segment);
+      ADD_FAILURE() << "nothing was thrown";
+    } catch (const std::exception& e) {
+      EXPECT_TRUE(typeid(e) == typeid(std::logic_error)) << typeid(e).name() << ": " << e.what();
+    }
+  }
+}
+
+TEST_P(JwtPart, EndsAtAZeroByteOfTheSegment) {
+  EXPECT_EQ(Get(std::string("eyJhIjoxfQ\0!!!!", 15))["a"], 1);
+}
+
+TEST_P(JwtPart, EndsAtAZeroByteOfTheDecodedText) {
+  EXPECT_EQ(Get(Base64Url(std::string("{\"a\":1}\0}}}}", 12)))["a"], 1);
+  ExpectRefused(Base64Url(std::string("{\"a\":\0 1}", 9)));
+}
+
+TEST_P(JwtPart, KeepsComments) {
+  const Json::Value value = Get(Base64Url("/* why */ {\"a\":1}"));
+  EXPECT_EQ(value["a"], 1);
+  EXPECT_EQ(value.getComment(Json::commentBefore), "/* why */");
+}
+
+TEST_P(JwtPart, NestedTooDeeplyIsRefused) {
+  EXPECT_TRUE(Get(Base64Url(std::string(1000, '[') + std::string(1000, ']'))).isArray());
+  ExpectRefused(Base64Url(std::string(1001, '[') + std::string(1001, ']')));
+  ExpectRefused(Base64Url(std::string(100000, '[')));
+}
+
+TEST_P(JwtPart, OfAMegabyteIsRead) {
+  const std::string text(1 << 20, 'x');
+  EXPECT_EQ(Get(Base64Url("\"" + text + "\"")), text);
+}
+
+}  // namespace
