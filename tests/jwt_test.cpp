@@ -3,41 +3,19 @@
 
 #include <gtest/gtest.h>
 #include <json/reader.h>
-#include <openssl/evp.h>
 
-#include <functional>
 #include <string>
-#include <typeinfo>
-#include <vector>
+
+#include "support/faults.h"
+#include "support/log.h"
+#include "support/throws.h"
+#include "support/tokens.h"
 
 namespace {
 
 using QOVA::JWT::Jwt;
-
-// Base64url without padding (RFC 7515, section 2).
-std::string Base64Url(const std::string& bytes) {
-  std::vector<unsigned char> text(bytes.size() * 2 + 8);
-  const int length =
-      EVP_EncodeBlock(text.data(), reinterpret_cast<const unsigned char*>(bytes.data()),
-                      static_cast<int>(bytes.size()));
-  std::string result(text.begin(), text.begin() + length);
-  result.resize(result.find_last_not_of('=') + 1);
-  for (char& c : result) c = c == '+' ? '-' : c == '/' ? '_' : c;
-  return result;
-}
-
-// The exception of exactly this type and text, or a failed test.
-template <typename Error>
-void ExpectThrows(const std::function<void()>& call, const std::string& message) {
-  try {
-    call();
-  } catch (const std::exception& e) {
-    EXPECT_TRUE(typeid(e) == typeid(Error)) << typeid(e).name() << ": " << e.what();
-    EXPECT_EQ(e.what(), message);
-    return;
-  }
-  ADD_FAILURE() << "nothing was thrown instead of: " << message;
-}
+using test::base64url;
+using test::throws;
 
 // GetHeader and GetBody are one operation on two segments: what holds for one is tried on both.
 struct Part {
@@ -67,8 +45,12 @@ class JwtPart : public testing::TestWithParam<Part> {
 
   static void ExpectRefused(const std::string& segment) {
     SCOPED_TRACE(testing::PrintToString(segment));
-    ExpectThrows<std::invalid_argument>([&] { Get(segment); }, GetParam().message);
+    EXPECT_TRUE(throws<std::invalid_argument>([&] { Get(segment); }, GetParam().message));
   }
+
+  void TearDown() override { EXPECT_TRUE(log.isEmpty()); }
+
+  test::Log log;
 };
 
 INSTANTIATE_TEST_SUITE_P(, JwtPart, testing::ValuesIn(kParts),
@@ -84,7 +66,7 @@ TEST(JwtSplit, TakesThreeSegmentsWhateverTheyHold) {
 TEST(JwtSplit, RefusesAnyOtherNumberOfSegments) {
   for (const char* token : {"", ".", "a", "a.b", "a.b.c.d", "...", "a..b.c", "a.b.c."}) {
     SCOPED_TRACE(token);
-    ExpectThrows<std::invalid_argument>([&] { Jwt{token}; }, "bad jwt format!");
+    EXPECT_TRUE(throws<std::invalid_argument>([&] { Jwt{token}; }, "bad jwt format!"));
   }
 }
 
@@ -92,7 +74,7 @@ TEST(JwtSplit, CountsSegmentsBehindAZeroByteToo) {
   const std::string three("a.b\0x.c", 7);
   EXPECT_NO_THROW(Jwt{three});
   const std::string four("a.b.c\0.d", 8);
-  ExpectThrows<std::invalid_argument>([&] { Jwt{four}; }, "bad jwt format!");
+  EXPECT_TRUE(throws<std::invalid_argument>([&] { Jwt{four}; }, "bad jwt format!"));
 }
 
 TEST(JwtSplit, LeavesTheSignatureSegmentAsItStands) {
@@ -129,7 +111,7 @@ TEST(JwtVector, OfTheStandardIsRead) {
 }
 
 TEST_P(JwtPart, IsReadTwiceAlike) {
-  Jwt jwt(GetParam().token(Base64Url(R"({"a":1})")));
+  Jwt jwt(GetParam().token(base64url(R"({"a":1})")));
   const Json::Value first = (jwt.*GetParam().get)();
   EXPECT_EQ((jwt.*GetParam().get)(), first);
   EXPECT_EQ(first["a"], 1);
@@ -139,13 +121,13 @@ TEST_P(JwtPart, IsReadTwiceAlike) {
 TEST_P(JwtPart, IsReadAtEveryLength) {
   for (size_t length = 0; length <= 1200; ++length) {
     const std::string text(length, 'x');
-    ASSERT_EQ(Get(Base64Url("{\"a\":\"" + text + "\"}"))["a"], text) << length;
+    ASSERT_EQ(Get(base64url("{\"a\":\"" + text + "\"}"))["a"], text) << length;
   }
 }
 
 TEST_P(JwtPart, OfOneCharacterMoreThanAFullGroupIsRefused) {
   for (const char* text : {"", "123", R"({"a":123})", R"({"a":"xy"}  )", R"({"a":"xy", "b":23})"}) {
-    const std::string segment = Base64Url(text);
+    const std::string segment = base64url(text);
     ASSERT_EQ(segment.size() % 4, 0u) << text;
     for (const char* extra : {"A", "g", "0", "-", "_", "=", "!"}) ExpectRefused(segment + extra);
   }
@@ -158,7 +140,7 @@ TEST_P(JwtPart, InStandardBase64IsReadAsWell) {
   EXPECT_EQ(Get("eyJhIjoxMn0=")["a"], 12);
   // "-" and "_", "+" and "/", and both kinds in one text.
   const std::string text = "\"\xc3\xbb\xc3\xbf\xc3\xbe\xc3\xbf\xc3\xbe~?~?>>??\"";
-  std::string url = Base64Url(text);
+  std::string url = base64url(text);
   ASSERT_NE(url.find('-'), std::string::npos) << url;
   ASSERT_NE(url.find('_'), std::string::npos) << url;
   std::string standard = url;
@@ -192,17 +174,17 @@ TEST_P(JwtPart, OfTwoCharactersIsTheByteTheyStandFor) {
 }
 
 TEST_P(JwtPart, NeedNotBeAnObject) {
-  EXPECT_EQ(Get(Base64Url("null")), Json::Value());
-  EXPECT_EQ(Get(Base64Url("[]")), Json::Value(Json::arrayValue));
-  EXPECT_EQ(Get(Base64Url("[1,2]"))[1], 2);
-  EXPECT_EQ(Get(Base64Url("502")), 502);
-  EXPECT_EQ(Get(Base64Url("\"text\"")), "text");
-  EXPECT_EQ(Get(Base64Url("true")), true);
+  EXPECT_EQ(Get(base64url("null")), Json::Value());
+  EXPECT_EQ(Get(base64url("[]")), Json::Value(Json::arrayValue));
+  EXPECT_EQ(Get(base64url("[1,2]"))[1], 2);
+  EXPECT_EQ(Get(base64url("502")), 502);
+  EXPECT_EQ(Get(base64url("\"text\"")), "text");
+  EXPECT_EQ(Get(base64url("true")), true);
 }
 
 TEST_P(JwtPart, ThatIsNotJsonIsRefused) {
   for (const char* text : {"{", "{\"a\":", "nul", "hello", "<html>", "\xff\xfe", "[1,", "\"open"})
-    ExpectRefused(Base64Url(text));
+    ExpectRefused(base64url(text));
 }
 
 TEST_P(JwtPart, ThatIsNotBase64IsRefused) {
@@ -214,12 +196,7 @@ TEST_P(JwtPart, ThatIsNotBase64IsRefused) {
 // Not one of the two messages: an absent text is not the same as a bad one.
 TEST_P(JwtPart, ThatIsEmptyIsALogicError) {
   for (const std::string& segment : {std::string(), std::string("\0eyJhIjoxfQ", 11)}) {
-    try {
-      Get(segment);
-      ADD_FAILURE() << "nothing was thrown";
-    } catch (const std::exception& e) {
-      EXPECT_TRUE(typeid(e) == typeid(std::logic_error)) << typeid(e).name() << ": " << e.what();
-    }
+    EXPECT_TRUE(throws<std::logic_error>([&] { Get(segment); }));
   }
 }
 
@@ -228,25 +205,39 @@ TEST_P(JwtPart, EndsAtAZeroByteOfTheSegment) {
 }
 
 TEST_P(JwtPart, EndsAtAZeroByteOfTheDecodedText) {
-  EXPECT_EQ(Get(Base64Url(std::string("{\"a\":1}\0}}}}", 12)))["a"], 1);
-  ExpectRefused(Base64Url(std::string("{\"a\":\0 1}", 9)));
+  EXPECT_EQ(Get(base64url(std::string("{\"a\":1}\0}}}}", 12)))["a"], 1);
+  ExpectRefused(base64url(std::string("{\"a\":\0 1}", 9)));
 }
 
 TEST_P(JwtPart, KeepsComments) {
-  const Json::Value value = Get(Base64Url("/* why */ {\"a\":1}"));
+  const Json::Value value = Get(base64url("/* why */ {\"a\":1}"));
   EXPECT_EQ(value["a"], 1);
   EXPECT_EQ(value.getComment(Json::commentBefore), "/* why */");
 }
 
 TEST_P(JwtPart, NestedTooDeeplyIsRefused) {
-  EXPECT_TRUE(Get(Base64Url(std::string(1000, '[') + std::string(1000, ']'))).isArray());
-  ExpectRefused(Base64Url(std::string(1001, '[') + std::string(1001, ']')));
-  ExpectRefused(Base64Url(std::string(100000, '[')));
+  EXPECT_TRUE(Get(base64url(std::string(1000, '[') + std::string(1000, ']'))).isArray());
+  ExpectRefused(base64url(std::string(1001, '[') + std::string(1001, ']')));
+  ExpectRefused(base64url(std::string(100000, '[')));
+}
+
+TEST_P(JwtPart, WithoutADecoderIsALogicError) {
+  for (const char* function : {"BIO_new", "BIO_new_mem_buf", "BIO_pending"}) {
+    test::Fault fault(function);
+    EXPECT_TRUE(throws<std::logic_error>([&] { Get("eyJhIjoxfQ"); })) << function;
+    EXPECT_TRUE(fault.wasHit()) << function;
+  }
+}
+
+TEST_P(JwtPart, ThatTheDecoderCannotReadIsRefused) {
+  test::Fault fault("BIO_read");
+  ExpectRefused("eyJhIjoxfQ");
+  EXPECT_TRUE(fault.wasHit());
 }
 
 TEST_P(JwtPart, OfAMegabyteIsRead) {
   const std::string text(1 << 20, 'x');
-  EXPECT_EQ(Get(Base64Url("\"" + text + "\"")), text);
+  EXPECT_EQ(Get(base64url("\"" + text + "\"")), text);
 }
 
 }  // namespace

@@ -1,0 +1,83 @@
+// Tokens when memory runs out: the library's own calls of malloc fail, one after the other.
+#include <gtest/gtest.h>
+#include <openssl/evp.h>
+
+#include <string>
+
+#include "sso/jwt.h"
+#include "support/faults.h"
+#include "support/log.h"
+#include "support/throws.h"
+#include "support/tokens.h"
+
+// Not found with dlsym, which allocates itself.
+extern "C" void* __libc_malloc(size_t size);
+
+extern "C" void* malloc(size_t size) {
+  return test::failsNow("malloc", __builtin_return_address(0)) ? nullptr : __libc_malloc(size);
+}
+
+namespace {
+
+using QOVA::JWT::Jwt;
+using QOVA::JWT::jwt_verify_failed;
+using test::throws;
+
+// Calls `attempt` with the first, the second, ... allocation failing, until there is no further
+// one. Returns how many there were.
+template <typename Attempt>
+int FailEachAllocation(const Attempt& attempt) {
+  for (int nth = 1; nth < 100; ++nth) {
+    bool hit = false;
+    testing::AssertionResult result = testing::AssertionSuccess();
+    {
+      test::Fault fault("malloc", nth);
+      result = attempt();
+      hit = fault.wasHit();
+    }
+    if (!hit) return nth - 1;
+    EXPECT_TRUE(result) << "allocation " << nth;
+  }
+  return 100;
+}
+
+TEST(JwtWithoutMemory, ReadsNoHeaderAndNoBody) {
+  test::Log log;
+  Jwt jwt("e30.e30.sig");
+  EXPECT_EQ(FailEachAllocation([&] { return throws<std::logic_error>([&] { jwt.GetHeader(); }); }),
+            1);
+  EXPECT_EQ(FailEachAllocation([&] { return throws<std::logic_error>([&] { jwt.GetBody(); }); }),
+            1);
+  EXPECT_EQ(jwt.GetBody(), Json::Value(Json::objectValue));
+  EXPECT_TRUE(log.isEmpty());
+}
+
+TEST(JwtWithoutMemory, FailsTheRsaCheckSilently) {
+  test::Log log;
+  const test::RsaKey& key = test::anyRsaKey();
+  std::string n = key.n();
+  std::string e = key.e();
+  Jwt jwt(test::rsaToken(key, "{}", "{}"));
+  const auto attempt = [&] {
+    return throws<jwt_verify_failed>([&] { jwt.JwtRSAVerify(n, e, EVP_sha256()); },
+                                     "verify rsa signature failed");
+  };
+  EXPECT_EQ(FailEachAllocation(attempt), 3) << "modulus, exponent, signature";
+  EXPECT_NO_THROW(jwt.JwtRSAVerify(n, e, EVP_sha256()));
+  EXPECT_TRUE(log.isEmpty());
+}
+
+TEST(JwtWithoutMemory, FailsTheHmacCheck) {
+  test::Log log;
+  std::string key = test::base64url("secret");
+  Jwt jwt(test::hmacToken("secret", "{}", "{}"));
+  const auto attempt = [&] {
+    return throws<jwt_verify_failed>([&] { jwt.JwtHMACVerify(key, EVP_sha256()); },
+                                     "verify hmac signature failed");
+  };
+  EXPECT_GE(FailEachAllocation(attempt), 1) << "the key";
+  EXPECT_NO_THROW(jwt.JwtHMACVerify(key, EVP_sha256()));
+  EXPECT_TRUE(log.isEmpty());
+}
+
+}  // namespace
