@@ -59,8 +59,8 @@ TEST(JwtWithoutMemory, FailsTheRsaCheckSilently) {
   std::string e = key.e();
   Jwt jwt(test::rsaToken(key, "{}", "{}"));
   const auto attempt = [&] {
-    return throws<jwt_verify_failed>([&] { jwt.JwtRSAVerify(n, e, EVP_sha256()); },
-                                     "verify rsa signature failed");
+    return throws<jwt_verify_failed>("verify rsa signature failed",
+                                     [&] { jwt.JwtRSAVerify(n, e, EVP_sha256()); });
   };
   EXPECT_EQ(FailEachAllocation(attempt), 3) << "modulus, exponent, signature";
   EXPECT_NO_THROW(jwt.JwtRSAVerify(n, e, EVP_sha256()));
@@ -72,8 +72,8 @@ TEST(JwtWithoutMemory, FailsTheHmacCheck) {
   std::string key = test::base64url("secret");
   Jwt jwt(test::hmacToken("secret", "{}", "{}"));
   const auto attempt = [&] {
-    return throws<jwt_verify_failed>([&] { jwt.JwtHMACVerify(key, EVP_sha256()); },
-                                     "verify hmac signature failed");
+    return throws<jwt_verify_failed>("verify hmac signature failed",
+                                     [&] { jwt.JwtHMACVerify(key, EVP_sha256()); });
   };
   EXPECT_GE(FailEachAllocation(attempt), 1) << "the key";
   EXPECT_NO_THROW(jwt.JwtHMACVerify(key, EVP_sha256()));

@@ -80,14 +80,14 @@ class JwtSignature : public testing::Test {
   void ExpectRsaRefused(const std::string& token, const std::string& n, const std::string& e,
                         const std::vector<test::Expected>& lines, const EVP_MD* md = EVP_sha256()) {
     log.clear();
-    EXPECT_TRUE(throws<jwt_verify_failed>([&] { VerifyRsa(token, n, e, md); }, kRsaFailed));
+    EXPECT_TRUE(throws<jwt_verify_failed>(kRsaFailed, [&] { VerifyRsa(token, n, e, md); }));
     EXPECT_TRUE(log.is(lines));
     log.clear();
   }
 
   void ExpectHmacRefused(const std::string& token, const std::string& key,
                          const EVP_MD* md = EVP_sha256()) {
-    EXPECT_TRUE(throws<jwt_verify_failed>([&] { VerifyHmac(token, key, md); }, kHmacFailed));
+    EXPECT_TRUE(throws<jwt_verify_failed>(kHmacFailed, [&] { VerifyHmac(token, key, md); }));
   }
 
   void TearDown() override { EXPECT_TRUE(log.isEmpty()); }
@@ -224,8 +224,8 @@ TEST_F(JwtRsa, FailsSilentlyWithoutModulusExponentOrSignature) {
 TEST_F(JwtRsa, RefusesNumbersThatDoNotDecode) {
   for (const char* number : {"!!!!", "A", "====", "AA"}) {
     EXPECT_TRUE(
-        throws<jwt_verify_failed>([&] { VerifyRsa(token, number, kExponent); }, kRsaFailed));
-    EXPECT_TRUE(throws<jwt_verify_failed>([&] { VerifyRsa(token, kModulus, number); }, kRsaFailed));
+        throws<jwt_verify_failed>(kRsaFailed, [&] { VerifyRsa(token, number, kExponent); }));
+    EXPECT_TRUE(throws<jwt_verify_failed>(kRsaFailed, [&] { VerifyRsa(token, kModulus, number); }));
   }
   EXPECT_LE(log.lines().size(), 8u);
   log.clear();

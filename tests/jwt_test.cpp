@@ -45,7 +45,7 @@ class JwtPart : public testing::TestWithParam<Part> {
 
   static void ExpectRefused(const std::string& segment) {
     SCOPED_TRACE(testing::PrintToString(segment));
-    EXPECT_TRUE(throws<std::invalid_argument>([&] { Get(segment); }, GetParam().message));
+    EXPECT_TRUE(throws<std::invalid_argument>(GetParam().message, [&] { Get(segment); }));
   }
 
   void TearDown() override { EXPECT_TRUE(log.isEmpty()); }
@@ -66,7 +66,7 @@ TEST(JwtSplit, TakesThreeSegmentsWhateverTheyHold) {
 TEST(JwtSplit, RefusesAnyOtherNumberOfSegments) {
   for (const char* token : {"", ".", "a", "a.b", "a.b.c.d", "...", "a..b.c", "a.b.c."}) {
     SCOPED_TRACE(token);
-    EXPECT_TRUE(throws<std::invalid_argument>([&] { Jwt{token}; }, "bad jwt format!"));
+    EXPECT_TRUE(throws<std::invalid_argument>("bad jwt format!", [&] { Jwt{token}; }));
   }
 }
 
@@ -74,7 +74,7 @@ TEST(JwtSplit, CountsSegmentsBehindAZeroByteToo) {
   const std::string three("a.b\0x.c", 7);
   EXPECT_NO_THROW(Jwt{three});
   const std::string four("a.b.c\0.d", 8);
-  EXPECT_TRUE(throws<std::invalid_argument>([&] { Jwt{four}; }, "bad jwt format!"));
+  EXPECT_TRUE(throws<std::invalid_argument>("bad jwt format!", [&] { Jwt{four}; }));
 }
 
 TEST(JwtSplit, LeavesTheSignatureSegmentAsItStands) {

@@ -9,9 +9,9 @@
 
 namespace test {
 
-// Use as EXPECT_TRUE(throws<std::invalid_argument>([&] { call(); }, "message")).
+// Use as EXPECT_TRUE(throws<std::invalid_argument>("message", [&] { call(); })).
 template <typename Error, typename Call>
-testing::AssertionResult throws(const Call& call, const std::string& message) {
+testing::AssertionResult throws(const std::string& message, const Call& call) {
   try {
     call();
   } catch (const std::exception& e) {
