@@ -1,0 +1,6 @@
+/* The reference platform under names of its own, for the spy to forward to. */
+#define QOVABase64Encode ReferenceBase64Encode
+#define QOVABase64Decode ReferenceBase64Decode
+#define QOVACGIURLEncode ReferenceCGIURLEncode
+#define QOVAWinsUserNameFqdn2Netbios ReferenceWinsUserNameFqdn2Netbios
+#include "platform/reference.c"
