@@ -1,8 +1,8 @@
 /* What the library needs from the device it runs on: four C functions.
  *
- * The reference implementation (platform/reference.c) is linked into the library unless the
- * build is given a device's own platform library (SSOCLIENT_PLATFORM_LIBRARY; README.md in this
- * folder). A function that is missing there is an error when the library is linked.
+ * One of the implementations in this folder (SSOCLIENT_PLATFORM) is linked into the library unless
+ * the build is given a device's own platform library (SSOCLIENT_PLATFORM_LIBRARY; README.md in
+ * this folder). A function that is missing there is an error when the library is linked.
  *
  * None of them may throw, keep a pointer that it was given, or write behind the capacity that it
  * was told. The library calls them from one thread.

@@ -3,4 +3,5 @@
 #define QOVABase64Decode ReferenceBase64Decode
 #define QOVACGIURLEncode ReferenceCGIURLEncode
 #define QOVAWinsUserNameFqdn2Netbios ReferenceWinsUserNameFqdn2Netbios
-#include "platform/reference.c"
+#include "platform/encoding.c"
+#include "platform/passthrough.c"

@@ -1,5 +1,4 @@
-/* The reference implementation of platform.h: standard base64, percent-encoding as in RFC 3986,
- * and user names passed through as they are. */
+/* The encodings of platform.h: standard base64, and percent-encoding as in RFC 3986. */
 #include <string.h>
 
 #include "platform/platform.h"
@@ -81,12 +80,5 @@ int QOVACGIURLEncode(const char* text, char* encoded, size_t capacity) {
     *encoded++ = kHex[c & 15];
   }
   *encoded = '\0';
-  return 0;
-}
-
-int QOVAWinsUserNameFqdn2Netbios(const char* name, char* result, size_t size) {
-  const size_t length = strlen(name);
-  if (length >= size) return -1;
-  memcpy(result, name, length + 1);
   return 0;
 }
