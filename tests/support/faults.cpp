@@ -15,11 +15,6 @@ const char* armed = nullptr;
 int calls_left = 0;
 bool hit = false;
 
-bool isInLibrary(const void* caller) {
-  Dl_info info;
-  return dladdr(caller, &info) != 0 && std::strstr(info.dli_fname, "libssoclient.so") != nullptr;
-}
-
 template <typename Function>
 Function* real(const char* name) {
   return reinterpret_cast<Function*>(dlsym(RTLD_NEXT, name));
@@ -43,8 +38,13 @@ bool Fault::wasHit() const {
   return hit;
 }
 
+bool isFromLibrary(const void* caller) {
+  Dl_info info;
+  return dladdr(caller, &info) != 0 && std::strstr(info.dli_fname, "libssoclient.so") != nullptr;
+}
+
 bool failsNow(const char* function, const void* caller) {
-  if (calls_left == 0 || std::strcmp(armed, function) != 0 || !isInLibrary(caller)) return false;
+  if (calls_left == 0 || std::strcmp(armed, function) != 0 || !isFromLibrary(caller)) return false;
   hit = --calls_left == 0;
   return hit;
 }

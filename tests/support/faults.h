@@ -19,6 +19,9 @@ class Fault {
   bool wasHit() const;  // whether that call was made
 };
 
+// Whether a call that returns to the address `caller` comes from the library under test.
+bool isFromLibrary(const void* caller);
+
 // Whether this call, which returns to the address `caller`, is the one to fail.
 bool failsNow(const char* function, const void* caller);
 
