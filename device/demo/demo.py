@@ -69,7 +69,7 @@ class Demo:
         self.stage.build()
         say(f"device: library, login program (set-id root), web server on {self.stage.device}")
         self.stage.install(prefix, programs, pages)
-        self.stage.start_web_server()
+        self.use_road("checked")
         say(f"provider: {self.provider.title} on {self.provider.url}")
         self.provider.start()
         self._clients()
@@ -99,18 +99,28 @@ class Demo:
     def choose(self, profile):
         self.stage.configure("profile", {"sso_enable": True, "sso_profile": profile}, 0o644)
 
-    def run(self, profile):
-        """Signs in and out with one client; each step says what it saw."""
-        self.choose(profile)
-        SignIn(self, profile).run()
+    def use_road(self, road):
+        """Plain: the login program calls OIDCLogin. Checked: it also compares the nonce."""
+        self.stage.start_web_server(SSO_LOGIN_ROAD=road)
+
+    def run(self):
+        """Signs in and out with each client, on each road; each step says what it saw."""
+        for road in ("plain", "checked"):
+            self.use_road(road)
+            for profile in ("azure", "websphere"):
+                self.choose(profile)
+                SignIn(self, profile, road).run()
 
 
 class SignIn:
-    STEPS = ("device page", "start of the login", "provider's login page", "name and password",
-             "consent", "code and state", "OIDCLogin and relay page", "signed in", "sign out")
+    EXCHANGE = {"plain": "OIDCLogin", "checked": "login with nonce check"}
 
-    def __init__(self, demo, profile):
+    def __init__(self, demo, profile, road):
         self.demo, self.profile = demo, profile
+        self.name = f"{profile}/{road}"
+        self.steps = ("device page", "start of the login", "provider's login page",
+                      "name and password", "consent", "code and state",
+                      self.EXCHANGE[road] + ", relay page", "signed in", "sign out")
         self.browser = Browser(demo.stage.authority)
         self.step = 0
 
@@ -118,11 +128,11 @@ class SignIn:
         try:
             self._road()
         except (BrowserError, StepError, KeyError) as error:
-            name = self.STEPS[self.step - 1]
-            raise StepError(f"{self.profile}: step {self.step} ({name}) failed: {error}") from error
+            step = self.steps[self.step - 1]
+            raise StepError(f"{self.name}: step {self.step} ({step}) failed: {error}") from error
 
     def _done(self, text):
-        say(f"{self.profile} {self.step}/{len(self.STEPS)} {self.STEPS[self.step - 1]}: {text}")
+        say(f"{self.name} {self.step}/{len(self.steps)} {self.steps[self.step - 1]}: {text}")
 
     def _redirect(self, page, prefix):
         """Where a page sends the browser, which must be below `prefix`."""
@@ -184,7 +194,7 @@ class SignIn:
         if "Nobody is signed in" not in self.browser.get(device + "/index.cgi").text:
             raise StepError("the device still has a session")
         self._done(f"{shown(url)} (status {self.browser.get(url).status})")
-        say(f"{self.profile}: user name {expected}")
+        say(f"{self.name}: user name {expected}")
 
 
 def serve(demo, profile, sockets):
@@ -239,9 +249,8 @@ def main():
         if options.serve:
             serve(demo, options.serve, options.sockets)
             return 0
-        for profile in ("azure", "websphere"):
-            demo.run(profile)
-        say("both sign-ins succeeded")
+        demo.run()
+        say("all sign-ins succeeded")
         return 0
     except (StageError, BrowserError, StepError) as error:
         show_logs(stage)

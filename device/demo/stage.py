@@ -88,7 +88,6 @@ class Stage:
         self.folder = FOLDER
         self.authority = FOLDER + "/ca.pem"
         self.logs = FOLDER + "/logs"
-        self.environment = {}
         self._device_name = device_name
         self._processes = {}
         self.log = None
@@ -238,9 +237,12 @@ class Stage:
         """Writes one of the device's three settings files."""
         write(f"{SETTINGS}/{name}.conf", json.dumps(values, indent=2) + "\n", mode)
 
-    def start_web_server(self):
+    def start_web_server(self, **environment):
+        """Starts the web server, again if it runs; the login program sees the environment."""
+        if "lighttpd" in self._processes:
+            self.stop("lighttpd")
         certificate, key = self.certificate(self._device_name)
-        pairs = ", ".join(f'"{name}" => "{value}"' for name, value in self.environment.items())
+        pairs = ", ".join(f'"{name}" => "{value}"' for name, value in environment.items())
         log = self.log_file("lighttpd", WEB_USER)
         write(FOLDER + "/lighttpd.conf", LIGHTTPD.format(
             port=self.device_port, user=WEB_USER, www=WWW, log=log, folder=FOLDER,

@@ -45,16 +45,6 @@ std::vector<std::string> Split(const std::string& text, char separator) {
   return pieces;
 }
 
-Values ReadQuery(const std::string& text) {
-  Values values;
-  for (const std::string& pair : Split(text, '&')) {
-    const size_t equals = pair.find('=');
-    if (equals == std::string::npos) continue;
-    values.emplace(Decode(pair.substr(0, equals)), Decode(pair.substr(equals + 1)));
-  }
-  return values;
-}
-
 Values ReadCookies(const std::string& text) {
   Values values;
   for (const std::string& pair : Split(text, ';')) {
@@ -80,6 +70,16 @@ const std::string& OneLine(const std::string& text) {
 Request ReadRequest() {
   return {Environment("REQUEST_METHOD"), ReadQuery(Environment("QUERY_STRING")),
           ReadCookies(Environment("HTTP_COOKIE"))};
+}
+
+Values ReadQuery(const std::string& text) {
+  Values values;
+  for (const std::string& pair : Split(text, '&')) {
+    const size_t equals = pair.find('=');
+    if (equals == std::string::npos) continue;
+    values.emplace(Decode(pair.substr(0, equals)), Decode(pair.substr(equals + 1)));
+  }
+  return values;
 }
 
 std::string Value(const Values& values, const std::string& name) {

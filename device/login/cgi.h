@@ -21,6 +21,9 @@ struct Request {
 // read.
 Request ReadRequest();
 
+// ReadQuery takes a query apart: names and values, decoded.
+Values ReadQuery(const std::string& text);
+
 // Value returns the value of a name, empty if there is none.
 std::string Value(const Values& values, const std::string& name);
 

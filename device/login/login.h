@@ -1,5 +1,7 @@
-// The steps of a login, each one request of the browser.
+// The steps of a login, each one request of the browser. They throw what goes wrong.
 #pragma once
+
+#include <string>
 
 #include "cgi.h"
 
@@ -12,5 +14,5 @@ void Callback(const cgi::Request& request);
 // Logout ends the session and sends the browser to the provider's logout.
 void Logout(const cgi::Request& request);
 
-// Fail sends the browser to the relay page with the reason, and logs it.
+// Fail logs what went wrong and sends the browser to the relay page with a short reason.
 void Fail(const cgi::Request& request, const std::string& text);

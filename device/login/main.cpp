@@ -19,15 +19,23 @@ void Dispatch(const cgi::Request& request) {
   throw std::invalid_argument("unknown request");
 }
 
-}  // namespace
-
-int main() {
-  const cgi::Request request = cgi::ReadRequest();
+void Serve(const cgi::Request& request) {
   try {
     StepDown();
     Dispatch(request);
   } catch (const std::exception& error) {
     Fail(request, error.what());
+  }
+}
+
+}  // namespace
+
+int main() {
+  try {
+    Serve(cgi::ReadRequest());
+  } catch (const std::exception&) {
+    // Not even the failure could be told, for want of memory: the page is static.
+    std::cout << "Status: 302 Found\nLocation: /webman/ssoclient/relay.html#success=false\n\n";
   }
   std::cout.flush();
 }

@@ -15,7 +15,9 @@ Store Sessions() {
 }  // namespace
 
 std::string Open(const std::string& user) {
-  return cgi::Cookie(kCookie, Sessions().Put(user));
+  const std::string key = Store::NewKey();
+  Sessions().Put(key, user);
+  return cgi::Cookie(kCookie, key);
 }
 
 std::string User(const cgi::Request& request) {

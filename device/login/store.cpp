@@ -16,19 +16,6 @@ namespace {
 constexpr char kFolder[] = "/run/ssoclient/";
 constexpr size_t kKeyBytes = 32;
 
-std::string RandomKey() {
-  unsigned char bytes[kKeyBytes];
-  if (getrandom(bytes, sizeof bytes, 0) != static_cast<ssize_t>(sizeof bytes)) {
-    throw std::runtime_error("no random bytes");
-  }
-  std::string key;
-  for (const unsigned char byte : bytes) {
-    key += "0123456789abcdef"[byte >> 4];
-    key += "0123456789abcdef"[byte & 15];
-  }
-  return key;
-}
-
 // Only a key that could be ours becomes a file name: it comes from the browser.
 bool IsKey(const std::string& text) {
   return text.size() == 2 * kKeyBytes &&
@@ -54,22 +41,33 @@ class File {
 Store::Store(const std::string& name, int lifetime, int capacity)
     : folder_(kFolder + name + "/"), lifetime_(lifetime), capacity_(capacity) {}
 
+std::string Store::NewKey() {
+  unsigned char bytes[kKeyBytes];
+  if (getrandom(bytes, sizeof bytes, 0) != static_cast<ssize_t>(sizeof bytes)) {
+    throw std::runtime_error("no random bytes");
+  }
+  std::string key;
+  for (const unsigned char byte : bytes) {
+    key += "0123456789abcdef"[byte >> 4];
+    key += "0123456789abcdef"[byte & 15];
+  }
+  return key;
+}
+
 std::string Store::Path(const std::string& key) const {
   return folder_ + key;
 }
 
-std::string Store::Put(const std::string& text) const {
+void Store::Put(const std::string& key, const std::string& text) const {
   if (mkdir(folder_.c_str(), 0700) != 0 && errno != EEXIST) {
     throw std::runtime_error("cannot make " + folder_);
   }
   Sweep();
-  const std::string key = RandomKey();
   const File file(Path(key), O_WRONLY | O_CREAT | O_EXCL);
   if (file.fd() < 0 ||
       write(file.fd(), text.data(), text.size()) != static_cast<ssize_t>(text.size())) {
     throw std::runtime_error("cannot write below " + folder_);
   }
-  return key;
 }
 
 std::optional<std::string> Store::Get(const std::string& key) const {

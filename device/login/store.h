@@ -12,9 +12,12 @@ class Store {
   // seconds are gone; at most `capacity` are kept.
   Store(const std::string& name, int lifetime, int capacity);
 
-  // Put keeps a text and returns its key: 64 hexadecimal digits that nobody can guess. Throws
-  // std::runtime_error if the text cannot be written, or the store is full.
-  std::string Put(const std::string& text) const;
+  // NewKey returns a key that nobody can guess: 64 hexadecimal digits.
+  static std::string NewKey();
+
+  // Put keeps a text under a new key. Throws std::runtime_error if it cannot be written, or the
+  // store is full.
+  void Put(const std::string& key, const std::string& text) const;
 
   // Get returns the text of a key, if there is one.
   std::optional<std::string> Get(const std::string& key) const;
