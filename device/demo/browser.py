@@ -82,18 +82,21 @@ class Browser:
             urllib.request.HTTPSHandler(context=ssl.create_default_context(cafile=authority)),
             urllib.request.HTTPCookieProcessor(self.cookies), _Stay())
 
-    def get(self, url):
+    def get(self, url, headers=None):
         """Fetches one page; a redirect is returned, not followed."""
-        return self._send(urllib.request.Request(url.split("#")[0]), url)
+        return self._send(urllib.request.Request(url.split("#")[0], headers=headers or {}), url)
 
     def submit(self, page, identity):
         """Sends a form of a page as it stands."""
         form = page.form(identity)
         url = urllib.parse.urljoin(page.url, form.get("action", ""))
-        data = urllib.parse.urlencode(form["fields"])
         if form.get("method", "get").lower() == "get":
-            return self.get(f"{url}?{data}")
-        return self._send(urllib.request.Request(url, data.encode()), url)
+            return self.get(f"{url}?{urllib.parse.urlencode(form['fields'])}")
+        return self.post(url, form["fields"])
+
+    def post(self, url, fields, headers=None):
+        data = urllib.parse.urlencode(fields).encode()
+        return self._send(urllib.request.Request(url, data, headers or {}), url)
 
     def call(self, method, url, value=None):
         """Calls a JSON interface as a page's script does; any answer but 200 is an error."""

@@ -15,6 +15,7 @@ import urllib.parse
 import forward
 from browser import Browser, BrowserError
 from providers.glewlwyd import Glewlwyd
+from servers import Lighttpd
 from stage import Stage, StageError
 
 DEVICE, PROVIDER = "device.localhost", "provider.localhost"
@@ -56,12 +57,27 @@ def values_of(url):
     return dict(urllib.parse.parse_qsl(parts.query or parts.fragment))
 
 
+def settings_of(name, client, endpoints, person):
+    """The content of a client's settings file."""
+    azure = {"azure_sso_enable": True, "azure_tenant_id": person.claims["tid"]}
+    return {
+        f"{name}_wellknown": endpoints["wellknown"],
+        f"{name}_client_id": client.identity,
+        f"{name}_client_secret": client.secret,
+        f"{name}_authorization_endpoint": endpoints["authorization"],
+        f"{name}_token_endpoint": endpoints["token"],
+        f"{name}_redirect_uri": client.redirect_uri,
+        f"{name}_logout_endpoint": endpoints["logout"],
+        **(azure if name == "azure" else {})}
+
+
 class Demo:
     def __init__(self, stage):
         self.stage = stage
         self.person = Person("alice", secrets.token_urlsafe(9), "alice@plant7.example.net", {
             "tid": "3f2a8f6e-demo-tenant", "unique_name": "alice@plant7.example.net"})
         self.provider = Glewlwyd(stage, self.person)
+        self.server = None
         self.expected = {"azure": "PLANT7.EXAMPLE.NET\\alice", "websphere": "alice"}
 
     def set_up(self, prefix, programs, pages):
@@ -80,28 +96,20 @@ class Demo:
                       self.stage.device + "/webman/ssoclient/relay.html")
 
     def _clients(self):
-        client = self._client("azure")
-        self._settings("azure", client, self.provider.add_azure(client), {
-            "azure_sso_enable": True, "azure_tenant_id": self.person.claims["tid"]})
-        client = self._client("websphere")
-        self._settings("websphere", client, self.provider.add_websphere(client), {})
-
-    def _settings(self, name, client, endpoints, more):
-        self.stage.configure(name, {
-            f"{name}_wellknown": endpoints["wellknown"],
-            f"{name}_client_id": client.identity,
-            f"{name}_client_secret": client.secret,
-            f"{name}_authorization_endpoint": endpoints["authorization"],
-            f"{name}_token_endpoint": endpoints["token"],
-            f"{name}_redirect_uri": client.redirect_uri,
-            f"{name}_logout_endpoint": endpoints["logout"], **more})
+        for name, add in (("azure", self.provider.add_azure),
+                          ("websphere", self.provider.add_websphere)):
+            client = self._client(name)
+            self.stage.configure(name, settings_of(name, client, add(client), self.person))
 
     def choose(self, profile):
         self.stage.configure("profile", {"sso_enable": True, "sso_profile": profile}, 0o644)
 
     def use_road(self, road):
         """Plain: the login program calls OIDCLogin. Checked: it also compares the nonce."""
-        self.stage.start_web_server(SSO_LOGIN_ROAD=road)
+        if self.server is not None:
+            self.server.stop()
+        self.server = Lighttpd(self.stage)
+        self.server.start({"SSO_LOGIN_ROAD": road})
 
     def run(self):
         """Signs in and out with each client, on each road; each step says what it saw."""

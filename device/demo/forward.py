@@ -25,7 +25,8 @@ def _copy(source, target):
         pass
 
 
-def _carry(outer, port):
+def carry(outer, port):
+    """Hands a connection on to a port of this namespace, until both sides are done."""
     with outer, socket.create_connection(("127.0.0.1", port), 10) as inner:
         inner.settimeout(None)
         back = threading.Thread(target=_copy, args=(inner, outer), daemon=True)
@@ -38,7 +39,7 @@ def _accept(door):
     port = door.getsockname()[1]
     while True:
         outer, _ = door.accept()
-        threading.Thread(target=_carry, args=(outer, port), daemon=True).start()
+        threading.Thread(target=carry, args=(outer, port), daemon=True).start()
 
 
 def start(descriptors):

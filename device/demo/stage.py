@@ -21,28 +21,6 @@ WWW = QOVA + "/www"
 BUNDLE = "/etc/ssl/certs/ca-certificates.crt"
 WEB_USER = "www-data"
 
-LIGHTTPD = """
-server.modules = ("mod_openssl", "mod_cgi", "mod_setenv")
-server.bind = "127.0.0.1"
-server.port = {port}
-server.username = "{user}"
-server.groupname = "{user}"
-server.document-root = "{www}"
-server.errorlog = "{log}"
-server.pid-file = "{folder}/lighttpd.pid"
-index-file.names = ("index.cgi")
-mimetype.assign = (".html" => "text/html; charset=utf-8", ".css" => "text/css",
-                   ".js" => "text/javascript")
-cgi.assign = (".cgi" => "")
-ssl.engine = "enable"
-ssl.pemfile = "{certificate}"
-ssl.privkey = "{key}"
-setenv.add-response-header = ("X-Content-Type-Options" => "nosniff", "X-Frame-Options" => "DENY",
-                              "Referrer-Policy" => "no-referrer")
-setenv.set-environment = ({environment})
-"""
-
-
 class StageError(Exception):
     """Something that the demo needs is not there; the message is for the person in front of it."""
 
@@ -88,7 +66,8 @@ class Stage:
         self.folder = FOLDER
         self.authority = FOLDER + "/ca.pem"
         self.logs = FOLDER + "/logs"
-        self._device_name = device_name
+        self.device_name = device_name
+        self.device_certificate = None
         self._processes = {}
         self.log = None
 
@@ -105,8 +84,9 @@ class Stage:
         self._private_dev()
         self._private_etc()
         self.log = SystemLog()
-        write("/etc/hosts", f"127.0.0.1 localhost {self._device_name} {self.provider_name}\n")
+        write("/etc/hosts", f"127.0.0.1 localhost {self.device_name} {self.provider_name}\n")
         self._authority()
+        self.device_certificate = self.certificate(self.device_name)
 
     def _private_dev(self):
         """A /dev of the namespace's own: the host's must not get our log socket."""
@@ -236,16 +216,3 @@ class Stage:
     def configure(self, name, values, mode=0o600):
         """Writes one of the device's three settings files."""
         write(f"{SETTINGS}/{name}.conf", json.dumps(values, indent=2) + "\n", mode)
-
-    def start_web_server(self, **environment):
-        """Starts the web server, again if it runs; the login program sees the environment."""
-        if "lighttpd" in self._processes:
-            self.stop("lighttpd")
-        certificate, key = self.certificate(self._device_name)
-        pairs = ", ".join(f'"{name}" => "{value}"' for name, value in environment.items())
-        log = self.log_file("lighttpd", WEB_USER)
-        write(FOLDER + "/lighttpd.conf", LIGHTTPD.format(
-            port=self.device_port, user=WEB_USER, www=WWW, log=log, folder=FOLDER,
-            certificate=certificate, key=key, environment=pairs))
-        self.spawn("lighttpd", ["lighttpd", "-D", "-f", FOLDER + "/lighttpd.conf"])
-        self.wait_for("lighttpd", self.device_port)

@@ -1,0 +1,254 @@
+"""A provider that does what a script tells it: what a certified provider refuses to show.
+
+Without a script it behaves: a login form, codes that serve once, RS256 with a published key for
+the Azure client, HS256 under the client's secret for the WebSphere client. A script changes
+one thing at a time, see Script. Everything that it was asked is kept in `seen`.
+"""
+
+import base64
+import dataclasses
+import hashlib
+import hmac
+import html
+import http.server
+import json
+import secrets
+import ssl
+import subprocess
+import threading
+import time
+import urllib.parse
+
+from browser import BrowserError
+from stage import run, write
+
+LOGIN_PAGE = """<!DOCTYPE html>
+<html lang="en"><head><meta charset="utf-8"><title>Provider</title></head><body><main>
+<h1>Sign in</h1><form id="login" method="post" action="{action}">
+<label>Name <input name="username" autocomplete="username"></label>
+<label>Password <input name="password" type="password"></label>
+<button>Sign in</button></form></main></body></html>"""
+
+
+def _base64url(data):
+    return base64.urlsafe_b64encode(data).rstrip(b"=").decode()
+
+
+@dataclasses.dataclass
+class Script:
+    """What to do otherwise. Each function gets what the provider would send, and returns what to
+    send instead."""
+    refuse: dict = None        # parameters of an error answer to the authorization request
+    claims: object = None      # changes the claims of the ID token
+    header: object = None      # changes the header of the ID token
+    signature: object = None   # changes the bytes of the signature
+    token_answer: object = None  # changes (status, type, body) of the token endpoint
+    silent: bool = False       # the token endpoint takes the request and does not answer
+
+
+@dataclasses.dataclass
+class Realm:
+    client: object
+    sign: object
+    header: dict
+    claims: dict
+    keys: list
+
+
+class Scripted:
+    title = "scripted provider"
+
+    def __init__(self, stage, person):
+        self.url = f"https://{stage.provider_name}:{stage.provider_port}"
+        self.script = Script()
+        self.seen = []
+        self._stage = stage
+        self._person = person
+        self._realms = {}
+        self._codes = {}
+        self._server = None
+        self._released = threading.Event()
+
+    # -- set-up ----------------------------------------------------------------------------
+
+    def start(self):
+        context = ssl.create_default_context(ssl.Purpose.CLIENT_AUTH)
+        context.load_cert_chain(*self._stage.certificate(self._stage.provider_name))
+        handler = type("Handler", (_Handler,), {"provider": self})
+        self._server = http.server.ThreadingHTTPServer(
+            ("127.0.0.1", self._stage.provider_port), handler)
+        self._server.daemon_threads = True
+        # The handshake belongs to the connection's own thread.
+        self._server.socket = context.wrap_socket(self._server.socket, server_side=True,
+                                                  do_handshake_on_connect=False)
+        threading.Thread(target=self._server.serve_forever, daemon=True).start()
+
+    def stop(self):
+        self.release()
+        self._server.shutdown()
+        self._server.server_close()
+
+    def release(self):
+        """Lets the requests go that a silent token endpoint holds; they get no answer."""
+        self._released.set()
+        self._released = threading.Event()
+
+    def hold(self):
+        self._released.wait(60)
+
+    def add_azure(self, client):
+        key = self._stage.folder + "/scripted.key"
+        write(key, run("openssl", "genpkey", "-algorithm", "RSA"), 0o600)
+        modulus = run("openssl", "rsa", "-in", key, "-noout", "-modulus").split("=")[1].strip()
+
+        def sign(data):
+            return subprocess.run(["openssl", "dgst", "-sha256", "-sign", key], input=data,
+                                  stdout=subprocess.PIPE, check=True, timeout=30).stdout
+
+        return self._add("azure", Realm(
+            client, sign, {"alg": "RS256", "kid": "key-1"}, dict(self._person.claims),
+            [{"kty": "RSA", "kid": "key-1", "n": _base64url(bytes.fromhex(modulus)),
+              "e": "AQAB"}]))
+
+    def add_websphere(self, client):
+        def sign(data):
+            return hmac.new(client.secret.encode(), data, hashlib.sha256).digest()
+        return self._add("websphere", Realm(
+            client, sign, {"alg": "HS256"}, {"sub": self._person.account}, []))
+
+    def _add(self, name, realm):
+        self._realms[name] = realm
+        return {part: f"{self.url}/{name}/{part}"
+                for part in ("wellknown", "authorization", "token", "logout")}
+
+    # -- a person in front of the login page -----------------------------------------------
+
+    def sign_in(self, browser, page):
+        """Fills in the login form; returns the page that follows."""
+        form = page.form("login")
+        return browser.post(urllib.parse.urljoin(page.url, form["action"]), {
+            "username": self._person.account, "password": self._person.password})
+
+    # -- the endpoints ---------------------------------------------------------------------
+
+    def authorization(self, name, query, form):
+        client = self._realms[name].client
+        if query.get("redirect_uri") != client.redirect_uri or \
+                query.get("client_id") != client.identity:
+            return 400, {}, "unknown client"
+        if self.script.refuse is not None:
+            return self._back(query, self.script.refuse)
+        if form is None:
+            action = f"/{name}/authorization?{urllib.parse.urlencode(query)}"
+            return 200, {}, LOGIN_PAGE.format(action=html.escape(action))
+        if form.get("password") != self._person.password:
+            return 403, {}, "wrong name or password"
+        code = secrets.token_urlsafe(16)
+        self._codes[code] = (name, query.get("nonce"))
+        return self._back(query, {"code": code})
+
+    @staticmethod
+    def _back(query, values):
+        values = {**values, "state": query.get("state", "")}
+        return 302, {"Location": query["redirect_uri"] + "?" +
+                     urllib.parse.urlencode(values, quote_via=urllib.parse.quote)}, ""
+
+    def token(self, name, form):
+        """The answer of the token endpoint: status, type, body."""
+        client = self._realms[name].client
+        realm, nonce = self._codes.pop(form.get("code"), (None, None))
+        if form.get("client_secret") != client.secret:
+            answer = 401, "application/json", json.dumps({"error": "invalid_client"})
+        elif realm != name or form.get("redirect_uri") != client.redirect_uri:
+            answer = 400, "application/json", json.dumps({"error": "invalid_grant"})
+        else:
+            answer = 200, "application/json", json.dumps({
+                "token_type": "Bearer", "access_token": secrets.token_urlsafe(24),
+                "expires_in": 3600, "id_token": self.id_token(name, nonce)})
+        change = self.script.token_answer
+        return answer if change is None else change(*answer)
+
+    def id_token(self, name, nonce):
+        realm = self._realms[name]
+        now = int(time.time())
+        claims = {"iss": f"{self.url}/{name}", "aud": realm.client.identity, "iat": now,
+                  "exp": now + 3600, "nonce": nonce, **realm.claims}
+        header = {"typ": "JWT", **realm.header}
+        if self.script.claims is not None:
+            claims = self.script.claims(claims)
+        if self.script.header is not None:
+            header = self.script.header(header)
+        signed = ".".join(_base64url(json.dumps(part).encode()) for part in (header, claims))
+        signature = realm.sign(signed.encode())
+        if self.script.signature is not None:
+            signature = self.script.signature(signature)
+        return signed + "." + _base64url(signature)
+
+    def documents(self, name, path):
+        if path == "wellknown":
+            return {"issuer": f"{self.url}/{name}", "jwks_uri": f"{self.url}/{name}/keys"}
+        return {"keys": self._realms[name].keys}
+
+    def known(self, name):
+        return name in self._realms
+
+    def last_code(self):
+        """A code that nobody has used yet."""
+        if not self._codes:
+            raise BrowserError("no code is waiting")
+        return next(reversed(self._codes))
+
+
+class _Handler(http.server.BaseHTTPRequestHandler):
+    provider = None
+    timeout = 30
+
+    def log_message(self, *_):
+        pass
+
+    def do_GET(self):  # noqa: N802 (the base class's name)
+        self._serve(None)
+
+    def do_POST(self):  # noqa: N802
+        size = int(self.headers.get("Content-Length", 0))
+        body = self.rfile.read(size).decode()
+        self._serve(dict(urllib.parse.parse_qsl(body, keep_blank_values=True)))
+
+    def _serve(self, form):
+        parts = urllib.parse.urlsplit(self.path)
+        query = dict(urllib.parse.parse_qsl(parts.query, keep_blank_values=True))
+        name, _, path = parts.path.lstrip("/").partition("/")
+        self.provider.seen.append((self.command, parts.path, query, form))
+        if not self.provider.known(name):
+            self._send(404, {}, "")
+        elif path == "authorization":
+            self._send(*self.provider.authorization(name, query, form))
+        elif path == "token" and form is not None:
+            self._token(name, form)
+        elif path in ("wellknown", "keys"):
+            self._send(200, {"Content-Type": "application/json"},
+                       json.dumps(self.provider.documents(name, path)))
+        elif path == "logout" and "post_logout_redirect_uri" in query:
+            self._send(302, {"Location": query["post_logout_redirect_uri"]}, "")
+        else:
+            self._send(200, {}, "signed out")
+
+    def _token(self, name, form):
+        if self.provider.script.silent:
+            self.provider.hold()
+            self.close_connection = True
+            return
+        status, kind, body = self.provider.token(name, form)
+        self._send(status, {"Content-Type": kind}, body)
+
+    def _send(self, status, headers, body):
+        data = body.encode()
+        try:
+            self.send_response(status)
+            headers = {"Content-Type": "text/html; charset=utf-8", **headers}
+            for field, value in {**headers, "Content-Length": str(len(data))}.items():
+                self.send_header(field, value)
+            self.end_headers()
+            self.wfile.write(data)
+        except OSError:  # whoever asked is gone
+            self.close_connection = True

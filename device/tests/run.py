@@ -1,0 +1,44 @@
+"""Runs the tests of the device; inside scripts/sandbox, called by scripts/check-device.
+
+  run.py BUILD-FOLDER [PATTERN]
+"""
+
+import os
+import sys
+import time
+import unittest
+
+HERE = os.path.dirname(os.path.abspath(__file__))
+
+
+class Result(unittest.TextTestResult):
+    """One line per test as it ends, with its time."""
+
+    def startTest(self, test):
+        self._begun = time.monotonic()
+        self._bad = len(self.failures) + len(self.errors)
+        super().startTest(test)
+
+    def stopTest(self, test):
+        good = len(self.failures) + len(self.errors) == self._bad
+        print(f"{'ok  ' if good else 'FAIL'} {time.monotonic() - self._begun:5.1f}s "
+              f"{type(test).__name__}.{test._testMethodName}", flush=True)
+        super().stopTest(test)
+
+
+def main():
+    os.environ["SSOCLIENT_BUILD"] = os.path.abspath(sys.argv[1])
+    sys.path.insert(0, HERE)
+    loader = unittest.TestLoader()
+    if len(sys.argv) > 2:
+        loader.testNamePatterns = [f"*{sys.argv[2]}*"]
+    suite = loader.discover(HERE)
+    result = unittest.TextTestRunner(sys.stdout, verbosity=0, resultclass=Result).run(suite)
+    failed = len({str(test).split(" (")[0] + str(test).split("(")[1]
+                  for test, _ in result.failures + result.errors})
+    print(f"{result.testsRun - failed} passed, {failed} failed")
+    return 0 if result.wasSuccessful() and result.testsRun > 0 else 1
+
+
+if __name__ == "__main__":
+    sys.exit(main())
