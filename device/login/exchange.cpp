@@ -35,8 +35,8 @@ std::string CheckedLogin(const std::string& code, const Json::Value& state) {
   client.OpenIDConnectLogin(code, user);
   Json::Value claims;
   client.GetUserInfo(claims);
-  const std::string nonce = Member(claims, "nonce");
-  if (nonce.empty() || MD5Digest(nonce) != Member(state, "nonce")) {
+  const std::string digest = MD5Digest(Member(claims, "nonce"));
+  if (digest.empty() || digest != Member(state, "nonce")) {
     throw std::runtime_error("nonce does not belong to this login");
   }
   return user;
@@ -95,7 +95,7 @@ bool ReadAll(int fd, int seconds, std::string& out) {
 [[noreturn]] void RunChild(int fd, const std::string& code, const Json::Value& state,
                            const Settings& settings) {
   // Should the web server end the parent, the child must not wait on for ever.
-  alarm(static_cast<unsigned>(settings.deadline) + 1);
+  alarm(static_cast<unsigned>(settings.deadline) * 2);
   WriteAll(fd, Answer(code, state, settings.plain).substr(0, kLongestAnswer));
   _exit(0);
 }

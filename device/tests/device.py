@@ -50,7 +50,7 @@ class Device:
         address = self.stage.device
         for name in ("azure", "websphere"):
             client = self.clients[name] = Client(
-                "device-" + name, secrets.token_urlsafe(32), address + self.server.login,
+                "device-" + name, secrets.token_urlsafe(24) + "+/=&%'", address + self.server.login,
                 address + "/webman/ssoclient/relay.html")
             add = {"azure": self.provider.add_azure, "websphere": self.provider.add_websphere}
             self.stage.configure(name, settings_of(name, client, add[name](client), self.person))

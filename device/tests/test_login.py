@@ -217,6 +217,8 @@ class Callback(DeviceTest):
                               "Location: /webman/ssoclient/relay.html#reason="
                               "provider%20refused%3A%20a%20%20Set-Cookie%3A%20evil%3D1%20%20%20%20b"
                               "&success=false\n\n$")
+        self.assertTrue(any(line.endswith("refused: a  Set-Cookie: evil=1    b")
+                            for line in self.log()), self.log())
 
     def test_long_reason_is_cut(self):
         self.device.provider.script = Script(refuse={"error": "x" * 500})
@@ -250,7 +252,7 @@ class Exchange(DeviceTest):
         page = self.browser.get(url)
         took = time.monotonic() - begun
         self.assert_refused(page, "provider did not answer in time")
-        self.assertTrue(2.5 < took < 6, f"the deadline is 3 s, it took {took:.1f} s")
+        self.assertTrue(2.5 < took < 5, f"the deadline is 3 s, it took {took:.1f} s")
         self.assertEqual(programs(), [], "a process is left behind")
 
     def test_identities_and_orphan(self):
@@ -287,16 +289,17 @@ class Exchange(DeviceTest):
             return 400, "application/json", json.dumps({
                 "error": form["code"] + form["client_secret"],
                 "error_description": self.device.provider.id_token("azure", "n"),
-                "form": urllib.parse.urlencode(form)})
+                "form": urllib.parse.urlencode(form, quote_via=urllib.parse.quote)})
 
         self.device.choose("azure")
         self.device.provider.script = Script(token_answer=echo)
         page = self.sign_in()
         self.assertEqual(self.relay(page)["reason"], "[...][...]")
+        secret = sent["client_secret"]
+        self.assertNotEqual(secret, urllib.parse.quote(secret, safe=""))
         for text in [page.headers["Location"], *self.log()]:
-            self.assertNotIn(sent["code"], text)
-            self.assertNotIn(sent["client_secret"], text)
-            self.assertNotIn("eyJ", text)
+            for never in (sent["code"], secret, urllib.parse.quote(secret, safe=""), "eyJ"):
+                self.assertNotIn(never, text)
 
     def test_exceptions_of_the_library(self):
         old = int(time.time()) - 10
@@ -408,7 +411,9 @@ class Requests(DeviceTest):
                 self.assertNotEqual(self.relay(page)["reason"], "")
 
     def test_forged_session(self):
-        for value in ("", "0" * 64, "../tickets/x", "/etc/passwd", "a" * 63):
+        self.start()
+        ticket = next(iter(self.browser.cookies)).value
+        for value in ("", "0" * 64, "a" * 63, "../tickets/" + ticket, "../../../etc/hostname"):
             page = self.new_browser().get(self.device.front_url,
                                           {"Cookie": "__Host-session=" + value})
             self.assertIn("Nobody is signed in", page.text)
