@@ -28,6 +28,11 @@ std::shared_ptr<EVP_PKEY> newKey() {
   return key;
 }
 
+std::string newName() {
+  static int count = 0;
+  return std::to_string(++count);
+}
+
 void extend(X509* certificate, X509* issuer, int kind, const std::string& value) {
   X509V3_CTX context;
   X509V3_set_ctx(&context, issuer, certificate, nullptr, nullptr, 0);
@@ -106,7 +111,10 @@ void provideBundle(const std::string& path) {
 
 }  // namespace
 
-Ca::Ca() : key(newKey()), self(newCertificate(key.get(), "Test authority", Validity::kNow)) {
+// Each authority has a name of its own: a stranger of the same name would count as a forger.
+Ca::Ca()
+    : key(newKey()),
+      self(newCertificate(key.get(), "Test authority " + newName(), Validity::kNow)) {
   extend(self.get(), self.get(), NID_basic_constraints, "critical,CA:TRUE");
   extend(self.get(), self.get(), NID_key_usage, "critical,keyCertSign,cRLSign");
   sign(self.get(), self.get(), key.get());

@@ -137,7 +137,7 @@ std::string receiveRequest(Connection& connection) {
   std::string raw;
   std::size_t end;
   while ((end = raw.find("\r\n\r\n")) == std::string::npos) {
-    if (!connection.receive(&raw)) return "";
+    if (!connection.receive(&raw) || raw[0] < 'A' || raw[0] > 'Z') return "";  // not HTTP
   }
   const Request request = parsed(raw);
   const std::string length = request.header("Content-Length");
