@@ -1,0 +1,251 @@
+// SSOClient: its settings, its hooks, and the shape of its dispatch table.
+#include <dlfcn.h>
+#include <gtest/gtest.h>
+#include <link.h>
+
+#include <cstring>
+#include <type_traits>
+
+#include "sso/azuresso.h"
+#include "sso/profile.h"
+#include "sso/sso.h"
+#include "sso/webspheresso.h"
+#include "support/log.h"
+#include "support/throws.h"
+
+namespace {
+
+using namespace QOVA::SSO;
+
+// A provider client as another program would write it: it fills the settings.
+struct Settings : SSOClient {
+  Settings() {
+    enable = true;
+    clientID = "client";
+    clientSecret = "secret";
+    redirectURI = "redirect";
+    authEndpoint = "auth";
+    tokenEndpoint = "token endpoint";
+    logoutEndpoint = "logout";
+    wellknownEndpoint = "wellknown";
+    code = "code";
+    token = "token";
+  }
+  using SSOClient::authEndpoint;
+  using SSOClient::clientID;
+  using SSOClient::clientSecret;
+  using SSOClient::code;
+  using SSOClient::enable;
+  using SSOClient::logoutEndpoint;
+  using SSOClient::redirectURI;
+  using SSOClient::token;
+  using SSOClient::tokenEndpoint;
+  using SSOClient::wellknownEndpoint;
+};
+
+struct Accessor {
+  const char* name;
+  std::string (SSOClient::*get)();
+  const char* value;
+};
+const Accessor kAccessors[] = {
+    {"client ID", &SSOClient::GetClientID, "client"},
+    {"client secret", &SSOClient::GetClientSecret, "secret"},
+    {"redirect URI", &SSOClient::GetRedirectURI, "redirect"},
+    {"token", &SSOClient::GetToken, "token"},
+    {"authorization endpoint", &SSOClient::GetAuthEndpoint, "auth"},
+    {"token endpoint", &SSOClient::GetTokenEndpoint, "token endpoint"},
+    {"well-known endpoint", &SSOClient::GetWellknownEndpoint, "wellknown"},
+    {"logout endpoint", &SSOClient::GetLogoutEndpoint, "logout"},
+};
+
+TEST(Client, StartsDisabledAndEmpty) {
+  SSOClient client;
+  EXPECT_FALSE(client.isEnable());
+  for (const Accessor& each : kAccessors) EXPECT_EQ((client.*each.get)(), "") << each.name;
+}
+
+TEST(Client, AccessorsAnswerTheirOwnSetting) {
+  Settings client;
+  EXPECT_TRUE(client.isEnable());
+  for (const Accessor& each : kAccessors) EXPECT_EQ((client.*each.get)(), each.value) << each.name;
+}
+
+TEST(Client, AccessorsReturnCopies) {
+  Settings client;
+  for (const Accessor& each : kAccessors) {
+    std::string copy = (client.*each.get)();
+    copy += " changed";
+    EXPECT_EQ((client.*each.get)(), each.value) << each.name;
+  }
+}
+
+TEST(Client, SettersStoreAnyTextAsItIs) {
+  Settings client;
+  for (const std::string& text : {std::string("x"), std::string(), std::string("a\0b", 3)}) {
+    client.SetCode(text);
+    EXPECT_EQ(client.code, text);
+    client.SetRedirectURI(text);
+    EXPECT_EQ(client.GetRedirectURI(), text);
+  }
+}
+
+TEST(Client, SettersChangeNothingElse) {
+  Settings client;
+  client.SetCode("new code");
+  client.SetRedirectURI("new redirect");
+  EXPECT_TRUE(client.isEnable());
+  for (const Accessor& each : kAccessors) {
+    const bool changed = std::string(each.name) == "redirect URI";
+    EXPECT_EQ((client.*each.get)(), changed ? "new redirect" : each.value) << each.name;
+  }
+}
+
+TEST(Client, HooksAreNotImplementedAndSaySo) {
+  SSOClient client;
+  std::string user = "before";
+  test::Log log;
+  EXPECT_TRUE(test::throws<sso_not_implemented>("VerifyIDToken not implemented",
+                                                [&] { client.VerifyIDToken(); }));
+  EXPECT_TRUE(test::throws<sso_not_implemented>("GetIDTokenReqParams not implemented",
+                                                [&] { client.GetIDTokenReqParams(); }));
+  EXPECT_TRUE(test::throws<sso_not_implemented>("GetUserName not implemented",
+                                                [&] { client.GetUserName(user); }));
+  EXPECT_TRUE(test::throws<sso_not_implemented>("ProcessTokenResponse not implemented", [&] {
+    client.ProcessTokenResponse(R"({"id_token":"x"})");
+  }));
+  EXPECT_EQ(user, "before");
+  EXPECT_EQ(client.GetToken(), "");
+  EXPECT_TRUE(log.isEmpty());
+}
+
+TEST(Client, FieldsStandInTheirOrder) {
+  Settings client;
+  const void* const fields[] = {&client.enable,         &client.clientID,
+                                &client.clientSecret,   &client.redirectURI,
+                                &client.authEndpoint,   &client.tokenEndpoint,
+                                &client.logoutEndpoint, &client.wellknownEndpoint,
+                                &client.code,           &client.token};
+  for (std::size_t i = 1; i < std::size(fields); ++i) {
+    EXPECT_LT(fields[i - 1], fields[i]) << "field " << i + 1;
+  }
+}
+
+TEST(Client, NothingButTheFieldsAndTheTableIsInTheObjects) {
+  const std::size_t base = 2 * sizeof(void*) + 9 * sizeof(std::string);
+  EXPECT_EQ(sizeof(SSOClient), base);
+  EXPECT_EQ(sizeof(WebSphereSSOClient), base);
+  EXPECT_EQ(sizeof(AzureSSOClient), base + sizeof(std::string));  // the tenant
+  EXPECT_EQ(sizeof(SSOProfile), 2 * sizeof(void*) + sizeof(std::string) + base);
+}
+
+// Device programs were built against a base without a virtual destructor.
+TEST(Client, TheBaseDestructorIsNotVirtual) {
+  EXPECT_FALSE(std::has_virtual_destructor_v<SSOClient>);
+  EXPECT_TRUE(std::has_virtual_destructor_v<AzureSSOClient>);
+  EXPECT_TRUE(std::has_virtual_destructor_v<WebSphereSSOClient>);
+  EXPECT_TRUE(std::has_virtual_destructor_v<SSOProfile>);
+}
+
+// What the Itanium C++ ABI says of an object with virtual functions: its first word leads to the
+// table, and a pointer to a virtual member function holds the function's place in it.
+void* const* tableOf(const void* object) {
+  return *static_cast<void* const* const*>(object);
+}
+
+template <typename Member>
+std::size_t slotOf(Member member) {
+  std::ptrdiff_t parts[2];
+  static_assert(sizeof member == sizeof parts, "not the Itanium C++ ABI");
+  std::memcpy(parts, &member, sizeof parts);
+#if defined(__arm__) || defined(__aarch64__)
+  return static_cast<std::size_t>(parts[0]) / sizeof(void*) + 1;
+#else
+  return static_cast<std::size_t>(parts[0] - 1) / sizeof(void*) + 1;
+#endif
+}
+
+// The number of functions in a table, from the size of its symbol: two words stand before them.
+std::size_t lengthOf(const void* object) {
+  Dl_info info;
+  ElfW(Sym)* symbol = nullptr;
+  if (dladdr1(tableOf(object), &info, reinterpret_cast<void**>(&symbol), RTLD_DL_SYMENT) == 0 ||
+      symbol == nullptr) {
+    return 0;
+  }
+  return symbol->st_size / sizeof(void*) - 2;
+}
+
+TEST(DispatchTable, HasTheOperationsInTheirSlots) {
+  EXPECT_EQ(slotOf(&SSOClient::isEnable), 1u);
+  EXPECT_EQ(slotOf(&SSOClient::GetClientID), 2u);
+  EXPECT_EQ(slotOf(&SSOClient::GetClientSecret), 3u);
+  EXPECT_EQ(slotOf(&SSOClient::GetRedirectURI), 4u);
+  EXPECT_EQ(slotOf(&SSOClient::GetToken), 5u);
+  EXPECT_EQ(slotOf(&SSOClient::GetAuthEndpoint), 6u);
+  EXPECT_EQ(slotOf(&SSOClient::GetTokenEndpoint), 7u);
+  EXPECT_EQ(slotOf(&SSOClient::GetWellknownEndpoint), 8u);
+  EXPECT_EQ(slotOf(&SSOClient::GetLogoutEndpoint), 9u);
+  EXPECT_EQ(slotOf(&SSOClient::SetRedirectURI), 10u);
+  EXPECT_EQ(slotOf(&SSOClient::SetCode), 11u);
+  EXPECT_EQ(slotOf(&SSOClient::RequestWellknownInfo), 12u);
+  EXPECT_EQ(slotOf(&SSOClient::RequestTokenEndpoint), 13u);
+  EXPECT_EQ(slotOf(&SSOClient::VerifyIDToken), 14u);
+  EXPECT_EQ(slotOf(&SSOClient::GetIDTokenReqParams), 15u);
+  EXPECT_EQ(slotOf(&SSOClient::GetUserName), 16u);
+  EXPECT_EQ(slotOf(&SSOClient::ProcessTokenResponse), 17u);
+  EXPECT_EQ(slotOf(&SSOClient::OpenIDConnectLogin), 18u);
+}
+
+TEST(DispatchTable, HasNoOtherSlots) {
+  const SSOClient base;
+  const AzureSSOClient azure;
+  const WebSphereSSOClient websphere;
+  const SSOProfile profile;
+  EXPECT_EQ(lengthOf(&base), 18u);
+  EXPECT_EQ(lengthOf(&azure), 20u);  // the destructor takes two: with and without delete
+  EXPECT_EQ(lengthOf(&websphere), 20u);
+  EXPECT_EQ(lengthOf(&profile), 2u);
+}
+
+TEST(DispatchTable, ProvidersOverrideTheFourHooksAlone) {
+  const SSOClient base;
+  const AzureSSOClient azure;
+  const WebSphereSSOClient websphere;
+  for (std::size_t slot = 1; slot <= 18; ++slot) {
+    const bool hook = slot >= 14 && slot <= 17;
+    const void* const own = tableOf(&base)[slot - 1];
+    EXPECT_EQ(tableOf(&azure)[slot - 1] != own, hook) << "slot " << slot;
+    EXPECT_EQ(tableOf(&websphere)[slot - 1] != own, hook) << "slot " << slot;
+    if (!hook) continue;
+    EXPECT_NE(tableOf(&azure)[slot - 1], tableOf(&websphere)[slot - 1]) << "slot " << slot;
+  }
+}
+
+// The library's own function stands in a slot, not just a name in a header: reached as a device
+// program reaches it, by its number.
+TEST(DispatchTable, LeadsToTheOperationsThemselves) {
+  Settings client;
+  using Getter = std::string (*)(SSOClient*);
+  const struct {
+    std::size_t slot;
+    const char* value;
+  } getters[] = {{2, "client"}, {3, "secret"},         {4, "redirect"},  {5, "token"},
+                 {6, "auth"},   {7, "token endpoint"}, {8, "wellknown"}, {9, "logout"}};
+  for (const auto& each : getters) {
+    EXPECT_EQ(reinterpret_cast<Getter>(tableOf(&client)[each.slot - 1])(&client), each.value);
+  }
+  using Flag = bool (*)(SSOClient*);
+  EXPECT_TRUE(reinterpret_cast<Flag>(tableOf(&client)[0])(&client));
+}
+
+// The destructors follow the operations: the second one also frees the object.
+TEST(DispatchTable, ProvidersAreDestroyedThroughTheirOwnLastSlots) {
+  auto* const azure = new AzureSSOClient;
+  auto* const websphere = new WebSphereSSOClient;
+  using Delete = void (*)(void*);
+  reinterpret_cast<Delete>(tableOf(azure)[19])(azure);
+  reinterpret_cast<Delete>(tableOf(websphere)[19])(websphere);
+}
+
+}  // namespace
