@@ -224,11 +224,15 @@ std::string asProcess(Ids user, Ids group, const std::function<std::string()>& b
   return parts.back();
 }
 
-void asProcess(Ids both, const std::function<void()>& body) {
-  asProcess(both, both, [&] {
+void runAs(Ids user, Ids group, const std::function<void()>& body) {
+  asProcess(user, group, [&] {
     body();
     return std::string();
   });
+}
+
+void asProcess(Ids both, const std::function<void()>& body) {
+  runAs(both, both, body);
 }
 
 }  // namespace test

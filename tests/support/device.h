@@ -54,7 +54,8 @@ struct Ids {
 // Runs `body` in a child process with these user and group ids (no further groups). Failures of
 // assertions in there become failures of this test; what `body` returns is returned.
 std::string asProcess(Ids user, Ids group, const std::function<std::string()>& body);
-// The same for user and group alike, with nothing to return.
+// The same with nothing to return, and for user and group alike.
+void runAs(Ids user, Ids group, const std::function<void()>& body);
 void asProcess(Ids both, const std::function<void()>& body);
 
 }  // namespace test

@@ -5,6 +5,8 @@
 #include <cstdio>
 #include <regex>
 
+#include "support/busy.h"
+
 namespace {
 
 std::vector<test::LogLine>& recorded() {
@@ -14,6 +16,7 @@ std::vector<test::LogLine>& recorded() {
 
 void record(int priority, const char* format, va_list arguments) {
   const int error = errno;
+  const test::Busy busy;
   va_list again;
   va_copy(again, arguments);
 #pragma GCC diagnostic push
