@@ -355,7 +355,7 @@ TEST_P(GuardOf, ReadsAfterAFailedRaiseToo) {
 
 // The entering half leaves errno at 1 before its last line, whatever the call had failed with.
 TEST_P(GuardOf, SetsErrnoBeforeTheLineThatNamesTheHalf) {
-  for (const std::size_t failing : {1, 2, 3, 4, 5}) {
+  for (std::size_t failing = 1; failing <= 5; ++failing) {
     test::runAs(kUserRootSaved, kGroupRootSaved, [&] {
       test::IdsSpy spy;
       spy.failing = failing;
@@ -374,7 +374,7 @@ TEST_P(GuardOf, SetsErrnoBeforeTheLineThatNamesTheHalf) {
 }
 
 TEST_P(GuardOf, AsksForTheTextOfTheErrorInACleanBuffer) {
-  for (const std::size_t failing : {1, 2, 3, 4, 5}) {
+  for (std::size_t failing = 1; failing <= 5; ++failing) {
     test::runAs(kUserRootSaved, kGroupRootSaved, [&] {
       test::IdsSpy spy;
       spy.failing = failing;

@@ -77,7 +77,10 @@ SPY CURLcode curl_easy_setopt(CURL* handle, CURLoption option, ...) {
   note("setopt " + std::to_string(option));
   const auto real = next<CURLcode (*)(CURL*, CURLoption, ...)>("curl_easy_setopt");
   va_list arguments;
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wvarargs"  // libcurl declares it so: the last name is an enum
   va_start(arguments, option);
+#pragma GCC diagnostic pop
   CURLcode result;
   if (option < CURLOPTTYPE_OBJECTPOINT) {
     const long number = va_arg(arguments, long);
