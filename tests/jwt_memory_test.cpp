@@ -1,20 +1,27 @@
-// Tokens when memory runs out: the library's own calls of malloc fail, one after the other.
+// Tokens when memory runs out: the library's allocations fail, one after the other.
 #include <gtest/gtest.h>
 #include <openssl/evp.h>
 
+#include <new>
 #include <string>
 
 #include "sso/jwt.h"
 #include "support/faults.h"
 #include "support/log.h"
+#include "support/memory_spy.h"
 #include "support/throws.h"
 #include "support/tokens.h"
 
-// Not found with dlsym, which allocates itself.
-extern "C" void* __libc_malloc(size_t size);
+// The real one by its other name: finding it with dlsym would allocate.
+#if defined(__SANITIZE_ADDRESS__)
+#define REAL_MALLOC __interceptor_malloc
+#else
+#define REAL_MALLOC __libc_malloc
+#endif
+extern "C" void* REAL_MALLOC(size_t size);
 
-extern "C" void* malloc(size_t size) {
-  return test::failsNow("malloc", __builtin_return_address(0)) ? nullptr : __libc_malloc(size);
+extern "C" __attribute__((visibility("default"))) void* malloc(size_t size) {
+  return test::failsNow("malloc", __builtin_return_address(0)) ? nullptr : REAL_MALLOC(size);
 }
 
 namespace {
@@ -77,6 +84,46 @@ TEST(JwtWithoutMemory, FailsTheHmacCheck) {
   };
   EXPECT_GE(FailEachAllocation(attempt), 1) << "the key";
   EXPECT_NO_THROW(jwt.JwtHMACVerify(key, EVP_sha256()));
+  EXPECT_TRUE(log.isEmpty());
+}
+
+// Calls `operation` with the first, the second, ... operator new failing, until none fails.
+// Returns how many there were; each must come out as what it is.
+template <typename Operation>
+int FailEachNew(const Operation& operation) {
+  for (int nth = 1; nth < 1000; ++nth) {
+    bool thrown = false;
+    test::failNew(static_cast<size_t>(nth));
+    try {
+      operation();
+    } catch (const std::bad_alloc&) {
+      thrown = true;
+    }
+    const bool failed = test::newFailed();
+    test::failNew(0);
+    if (!failed) return nth - 1;
+    EXPECT_TRUE(thrown) << "operator new " << nth;
+  }
+  return 1000;
+}
+
+TEST(JwtWithoutMemory, LetsExhaustionPassAndReleasesEverything) {
+  test::Log log;
+  const test::RsaKey& key = test::anyRsaKey();
+  const std::string header = R"({"alg":"none", "a long name": ["a long value", 1, {"x":"y"}]})";
+  const std::string rsa = test::rsaToken(key, header, header);
+  const std::string hmac = test::hmacToken("secret", header, header);
+  std::string n = key.n();
+  std::string e = key.e();
+  std::string secret = test::base64url("secret");
+  Jwt rsa_jwt(rsa);
+  Jwt hmac_jwt(hmac);
+  EXPECT_GE(FailEachNew([&] { Jwt{rsa}; }), 3);
+  EXPECT_GE(FailEachNew([&] { rsa_jwt.GetHeader(); }), 3);
+  EXPECT_GE(FailEachNew([&] { rsa_jwt.GetBody(); }), 3);
+  EXPECT_EQ(FailEachNew([&] { rsa_jwt.GetSignature(); }), 1);
+  EXPECT_GE(FailEachNew([&] { rsa_jwt.JwtRSAVerify(n, e, EVP_sha256()); }), 1);
+  EXPECT_GE(FailEachNew([&] { hmac_jwt.JwtHMACVerify(secret, EVP_sha256()); }), 1);
   EXPECT_TRUE(log.isEmpty());
 }
 
