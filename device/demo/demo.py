@@ -104,12 +104,12 @@ class Demo:
     def choose(self, profile):
         self.stage.configure("profile", {"sso_enable": True, "sso_profile": profile}, 0o644)
 
-    def use_road(self, road):
+    def use_road(self, road, **environment):
         """Plain: the login program calls OIDCLogin. Checked: it also compares the nonce."""
         if self.server is not None:
             self.server.stop()
         self.server = Lighttpd(self.stage)
-        self.server.start({"SSO_LOGIN_ROAD": road})
+        self.server.start({"SSO_LOGIN_ROAD": road, **environment})
 
     def run(self):
         """Signs in and out with each client, on each road; each step says what it saw."""

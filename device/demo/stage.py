@@ -25,10 +25,10 @@ class StageError(Exception):
     """Something that the demo needs is not there; the message is for the person in front of it."""
 
 
-def run(*command):
+def run(*command, timeout=60):
     """Runs a command to its end; its output is shown only when it fails."""
     done = subprocess.run(command, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True,
-                          timeout=60, check=False)
+                          timeout=timeout, check=False)
     if done.returncode != 0:
         raise StageError(f"{' '.join(command[:2])} failed: {done.stdout.strip()[-300:]}")
     return done.stdout

@@ -132,10 +132,18 @@ class Glewlwyd:
         for scope in ("profile", "email"):
             self._api("POST", "scope/", {"name": scope, "display_name": scope,
                                          "password_required": False, "scheme": {}})
-        self._api("POST", "user/", {
-            "username": person.account, "password": person.password, "name": person.account,
-            "email": person.email, "enabled": True, **person.claims,
-            "scope": ["openid", "profile", "email", "g_profile"]})
+        self._api("POST", "user/", self._user())
+
+    def _user(self):
+        person = self._person
+        return {"username": person.account, "password": person.password, "name": person.account,
+                "email": person.email, "enabled": True, **person.claims,
+                "scope": ["openid", "profile", "email", "g_profile"]}
+
+    def change_claim(self, name, value):
+        """Gives a claim of the person another value."""
+        self._person.claims[name] = value
+        self._api("PUT", "user/" + self._person.account, self._user())
 
     def add_azure(self, client):
         """The realm of the Azure client; returns the URLs of its endpoints."""
