@@ -43,7 +43,7 @@ class Device:
         if self.server is not None:
             self.server.stop()
         self.server = server(self.stage)
-        self.server.start({"SSO_LOGIN_DEADLINE": "3", **environment})
+        self.server.start(environment)
         self._register()
 
     def _register(self):

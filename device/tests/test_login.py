@@ -18,6 +18,7 @@ from servers import Lighttpd
 
 FOREIGN = ("https://evil.example/", "//evil.example/", "/\\evil.example", "javascript:alert(1)",
            "evil", "", "/" + "a" * 300, "/é", "/\"", "/<b>")
+DEADLINE = 4  # seconds; the child's own clock is set to twice as much
 
 
 def state_of(url):
@@ -245,33 +246,6 @@ class Exchange(DeviceTest):
             name: value for name, value in claims.items() if name != "nonce"}),
             "nonce does not belong to this login")
 
-    def test_silent_provider(self):
-        self.device.provider.script = Script(silent=True)
-        url = self.callback_url()
-        begun = time.monotonic()
-        page = self.browser.get(url)
-        took = time.monotonic() - begun
-        self.assert_refused(page, "provider did not answer in time")
-        self.assertTrue(2.5 < took < 5, f"the deadline is 3 s, it took {took:.1f} s")
-        self.assertEqual(programs(), [], "a process is left behind")
-
-    def test_identities_and_orphan(self):
-        """While it waits: effective ids of the web server, root saved. And when the web server
-        ends the login program, its child does not wait for ever."""
-        self.device.provider.script = Script(silent=True)
-        url = self.callback_url()
-        waiting = threading.Thread(target=self.browser.get, args=(url,))
-        waiting.start()
-        wait_until(lambda: len(programs()) == 2)
-        for pid in programs():
-            with open(f"/proc/{pid}/status", encoding="ascii") as status:
-                ids = {line.split()[0]: line.split()[1:4] for line in status if "id:" in line}
-            self.assertEqual(ids["Uid:"], ["33", "33", "0"])
-            self.assertEqual(ids["Gid:"], ["33", "33", "0"])
-        os.kill(programs()[0], 9)
-        waiting.join(20)
-        wait_until(lambda: not programs())
-
     def test_error_response(self):
         document = {"error": "invalid_grant", "error_description": "It is <b>gone</b>."}
         self.refused(Script(token_answer=lambda *_: (400, "application/json",
@@ -359,6 +333,54 @@ class Exchange(DeviceTest):
             self.device.stage.configure("websphere", before)
 
 
+class Deadline(DeviceTest):
+    """A provider that takes the request and never answers."""
+
+    @classmethod
+    def setUpClass(cls):
+        device().use(Lighttpd, SSO_LOGIN_DEADLINE=str(DEADLINE))
+
+    @classmethod
+    def tearDownClass(cls):
+        device().use(Lighttpd)
+
+    def test_silent_provider(self):
+        self.device.provider.script = Script(silent=True)
+        url = self.callback_url()
+        begun = time.monotonic()
+        page = self.browser.get(url)
+        took = time.monotonic() - begun
+        self.assert_refused(page, "provider did not answer in time")
+        self.assertTrue(DEADLINE - 0.5 < took < 2 * DEADLINE, f"it took {took:.1f} s")
+        self.assertEqual(programs(), [], "a process is left behind")
+
+    def test_identities_and_orphan(self):
+        """While it waits: effective ids of the web server, root saved. And when the web server
+        ends the login program, its child does not wait for ever."""
+        self.device.provider.script = Script(silent=True)
+        url = self.callback_url()
+        waiting = threading.Thread(target=self.browser.get, args=(url,))
+        waiting.start()
+        # The child is past the settings when it talks to the provider: its ids are at rest.
+        wait_until(lambda: any(path.endswith("/token")
+                               for _, path, _, _ in self.device.provider.seen))
+        self.assertEqual(len(programs()), 2)
+        for pid in programs():
+            with open(f"/proc/{pid}/status", encoding="ascii") as status:
+                ids = {line.split()[0]: line.split()[1:4] for line in status if "id:" in line}
+            self.assertEqual(ids["Uid:"], ["33", "33", "0"])
+            self.assertEqual(ids["Gid:"], ["33", "33", "0"])
+        os.kill(programs()[0], 9)
+        waiting.join(20)
+        wait_until(lambda: not programs())
+
+    def test_plain_road(self):
+        self.addCleanup(self.setUpClass)
+        self.device.use(Lighttpd, SSO_LOGIN_DEADLINE="1", SSO_LOGIN_ROAD="plain")
+        self.device.provider.script = Script(silent=True)
+        self.assert_refused(self.sign_in(), "provider did not answer in time")
+
+
 class Plain(DeviceTest):
     """The switchable road through OIDCLogin alone."""
 
@@ -394,10 +416,6 @@ class Plain(DeviceTest):
                 url = with_state(self.callback_url(),
                                  lambda state, o=origin: {**state, "origin": o})
                 self.assertEqual(self.relay(self.browser.get(url)), {"success": "true"})
-
-    def test_silent_provider(self):
-        self.device.provider.script = Script(silent=True)
-        self.assert_refused(self.sign_in(), "provider did not answer in time")
 
 
 class Requests(DeviceTest):
