@@ -4,7 +4,6 @@
 #include <link.h>
 
 #include <cstring>
-#include <type_traits>
 
 #include "sso/azuresso.h"
 #include "sso/profile.h"
@@ -117,34 +116,6 @@ TEST(Client, HooksAreNotImplementedAndSaySo) {
   EXPECT_EQ(user, "before");
   EXPECT_EQ(client.GetToken(), "");
   EXPECT_TRUE(log.isEmpty());
-}
-
-TEST(Client, FieldsStandInTheirOrder) {
-  Settings client;
-  const void* const fields[] = {&client.enable,         &client.clientID,
-                                &client.clientSecret,   &client.redirectURI,
-                                &client.authEndpoint,   &client.tokenEndpoint,
-                                &client.logoutEndpoint, &client.wellknownEndpoint,
-                                &client.code,           &client.token};
-  for (std::size_t i = 1; i < std::size(fields); ++i) {
-    EXPECT_LT(fields[i - 1], fields[i]) << "field " << i + 1;
-  }
-}
-
-TEST(Client, NothingButTheFieldsAndTheTableIsInTheObjects) {
-  const std::size_t base = 2 * sizeof(void*) + 9 * sizeof(std::string);
-  EXPECT_EQ(sizeof(SSOClient), base);
-  EXPECT_EQ(sizeof(WebSphereSSOClient), base);
-  EXPECT_EQ(sizeof(AzureSSOClient), base + sizeof(std::string));  // the tenant
-  EXPECT_EQ(sizeof(SSOProfile), 2 * sizeof(void*) + sizeof(std::string) + base);
-}
-
-// Device programs were built against a base without a virtual destructor.
-TEST(Client, TheBaseDestructorIsNotVirtual) {
-  EXPECT_FALSE(std::has_virtual_destructor_v<SSOClient>);
-  EXPECT_TRUE(std::has_virtual_destructor_v<AzureSSOClient>);
-  EXPECT_TRUE(std::has_virtual_destructor_v<WebSphereSSOClient>);
-  EXPECT_TRUE(std::has_virtual_destructor_v<SSOProfile>);
 }
 
 // What the Itanium C++ ABI says of an object with virtual functions: its first word leads to the

@@ -328,4 +328,58 @@ TEST_F(DiscoveryHandlers, VerificationIsNeverSwitchedOff) {
   EXPECT_TRUE(spy.numbers.empty());
 }
 
+// The write function with which both collect an answer, taken from libcurl's side.
+class CollectAnswer : public testing::TestWithParam<int> {
+ protected:
+  void SetUp() override {
+    test::CurlSpy spy;
+    spy.onPerform = [](CURL*) { return CURLE_OK; };
+    Client client("http://localhost/", "http://localhost/");
+    Json::Value doc;
+    if (GetParam() == 0) {
+      client.RequestWellknownInfo(doc);
+    } else {
+      client.RequestTokenEndpoint(collected, "a=1");
+    }
+    collect = reinterpret_cast<Collect>(const_cast<void*>(spy.pointers[CURLOPT_WRITEFUNCTION]));
+  }
+
+  // Hands `bytes` over in a block of its own: nothing behind them may be read.
+  unsigned give(const std::string& bytes, unsigned size, unsigned count) {
+    const std::vector<char> block(bytes.begin(), bytes.end());
+    return collect(const_cast<char*>(block.data()), size, count, &collected);
+  }
+
+  using Collect = unsigned (*)(void*, unsigned, unsigned, void*);
+  Collect collect = nullptr;
+  std::string collected = "";
+};
+INSTANTIATE_TEST_SUITE_P(, CollectAnswer, testing::Values(0, 1), [](const auto& each) {
+  return std::string(each.param == 0 ? "wellknown" : "token");
+});
+
+TEST_P(CollectAnswer, AppendsAChunkThatNoZeroEnds) {
+  EXPECT_EQ(give("abcdef", 1, 6), 6u);
+  EXPECT_EQ(give("ghi", 3, 1), 3u);
+  EXPECT_EQ(collected, "abcdefghi");
+}
+
+TEST_P(CollectAnswer, TakesSizeTimesCountBytes) {
+  EXPECT_EQ(give("abcdef", 2, 3), 6u);
+  EXPECT_EQ(collected, "abcdef");
+  EXPECT_EQ(give("abcdef", 2, 2), 4u);
+  EXPECT_EQ(collected, "abcdefabcd");
+  EXPECT_EQ(give("", 1, 0), 0u);
+  EXPECT_EQ(give("", 0, 1), 0u);
+  EXPECT_EQ(collected, "abcdefabcd");
+}
+
+// Deliberate: the rest of the chunk is lost, and the whole of it counts as taken.
+TEST_P(CollectAnswer, CutsAChunkAtAZeroByteAndReportsAllOfIt) {
+  EXPECT_EQ(give(std::string("ab\0cd", 5), 1, 5), 5u);
+  EXPECT_EQ(give(std::string("\0xyz", 4), 1, 4), 4u);
+  EXPECT_EQ(give("ef", 1, 2), 2u);
+  EXPECT_EQ(collected, "abef");
+}
+
 }  // namespace

@@ -89,6 +89,12 @@ TEST(OIDCLogin, DoesNotReadADirectory) {
   EXPECT_TRUE(test::throws<sso_op_failed>(kUnreadable, [&] { login(&user); }));
 }
 
+TEST(OIDCLogin, DoesNotGetOverABrokenRead) {
+  ASSERT_EQ(symlink("/proc/self/mem", test::configPath("profile.conf").c_str()), 0);
+  std::string user;
+  EXPECT_TRUE(test::throws<sso_op_failed>(kUnreadable, [&] { login(&user); }));
+}
+
 // jsoncpp has an exception of its own for this; it counts as a failed parse.
 TEST(OIDCLogin, DoesNotReadAFileThatIsNestedTooDeep) {
   for (const char* const text : {"[", R"({"a":)"}) {

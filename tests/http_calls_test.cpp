@@ -1,6 +1,7 @@
 // httpGet and httpPost as libcurl sees them: which calls, in which order, with which arguments.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <new>
 #include <ostream>
 #include <stdexcept>
@@ -8,6 +9,7 @@
 #include "sso/utils.h"
 #include "support/curl_spy.h"
 #include "support/log.h"
+#include "support/memory_spy.h"
 #include "support/provider.h"
 #include "support/throws.h"
 
@@ -129,6 +131,35 @@ TEST_P(HttpCalls, AFailedTransferThrowsTheTextOfItsCode) {
     EXPECT_EQ(spy.calls, GetParam().calls);
     EXPECT_TRUE(log.isEmpty());
   }
+}
+
+// Whichever allocation fails, the handle and the global state are released.
+TEST_P(HttpCalls, ExhaustedMemoryLeavesNothingBehind) {
+  test::CurlSpy spy;
+  spy.onPerform = [](CURL*) { return CURLE_COULDNT_CONNECT; };
+  std::size_t thrown = 0;
+  bool failed = true;
+  for (std::size_t nth = 1; nth <= 50 && failed; ++nth) {
+    spy.calls.clear();
+    test::failNew(nth);
+    try {
+      request();
+    } catch (const std::bad_alloc&) {
+      ++thrown;
+    } catch (const sso_err_resp&) {
+    }
+    failed = test::newFailed();
+    test::failNew(0);
+    const auto count = [&](const char* call) {
+      return std::count(spy.calls.begin(), spy.calls.end(), call);
+    };
+    EXPECT_EQ(count("easy_init"), count("easy_cleanup"));
+    ASSERT_FALSE(spy.calls.empty());
+    EXPECT_EQ(spy.calls.front(), "global_init 3");
+    EXPECT_EQ(spy.calls.back(), "global_cleanup");
+  }
+  EXPECT_FALSE(failed);
+  EXPECT_GT(thrown, 0u);
 }
 
 TEST_P(HttpCalls, AnyExceptionPassesAndLeavesNothingBehind) {

@@ -5,7 +5,7 @@
 #include <unistd.h>
 
 #include <ostream>
-#include <type_traits>
+#include <typeinfo>
 
 #include "sso/azuresso.h"
 #include "sso/profile.h"
@@ -139,6 +139,16 @@ TEST(SSOProfile, WithADirectoryInsteadOfAFileIsOff) {
   EXPECT_EQ(profile.GetSSOProfile(), "");
 }
 
+// It can be opened and not be read.
+TEST(SSOProfile, WithABrokenReadIsOff) {
+  ASSERT_EQ(symlink("/proc/self/mem", test::configPath("profile.conf").c_str()), 0);
+  test::Log log;
+  SSOProfile profile;
+  EXPECT_FALSE(profile.SSOIsEnable());
+  EXPECT_EQ(profile.GetSSOProfile(), "");
+  EXPECT_TRUE(log.isEmpty());
+}
+
 TEST(SSOProfile, WithAFileThatIsNestedTooDeepIsOff) {
   test::writeConfig("profile.conf",
                     R"({"sso_enable":true,"sso_profile":"azure","a":)" + std::string(5000, '['));
@@ -212,7 +222,7 @@ TEST(SSOProfile, IsReadOnceAndNotAgain) {
   EXPECT_EQ(settingsOf(profile.GetSSOClient()), kAzure);
 }
 
-TEST(SSOProfile, HasAVirtualDestructorAndNoBase) {
+TEST(SSOProfile, CanBeDerivedFromAndDestroyedThroughItsOwnType) {
   struct Derived : SSOProfile {
     explicit Derived(bool* flag) : gone(flag) {}
     ~Derived() override { *gone = true; }
