@@ -4,6 +4,7 @@
 #include <link.h>
 
 #include <cstring>
+#include <utility>
 
 #include "sso/azuresso.h"
 #include "sso/profile.h"
@@ -98,6 +99,36 @@ TEST(Client, SettersChangeNothingElse) {
     const bool changed = std::string(each.name) == "redirect URI";
     EXPECT_EQ((client.*each.get)(), changed ? "new redirect" : each.value) << each.name;
   }
+}
+
+// The settings of a provider's client as another object holds them: all of them, and no hooks.
+testing::AssertionResult hasAllSettings(SSOClient* client) {
+  if (!client->isEnable()) return testing::AssertionFailure() << "enable flag";
+  for (const Accessor& each : kAccessors) {
+    if ((client->*each.get)() != each.value) return testing::AssertionFailure() << each.name;
+  }
+  return testing::AssertionSuccess();
+}
+
+TEST(Client, CopiesHaveAllSettings) {
+  const Settings original;
+  SSOClient copy(original);
+  SSOClient assigned;
+  assigned = original;
+  EXPECT_TRUE(hasAllSettings(&copy));
+  EXPECT_TRUE(hasAllSettings(&assigned));
+  copy.SetRedirectURI("changed");
+  EXPECT_EQ(assigned.GetRedirectURI(), "redirect");
+  EXPECT_EQ(original.redirectURI, "redirect");
+}
+
+TEST(Client, MovesTakeAllSettings) {
+  Settings original;
+  SSOClient moved(std::move(original));
+  EXPECT_TRUE(hasAllSettings(&moved));
+  SSOClient assigned;
+  assigned = std::move(moved);
+  EXPECT_TRUE(hasAllSettings(&assigned));
 }
 
 TEST(Client, HooksAreNotImplementedAndSaySo) {
