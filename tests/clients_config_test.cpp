@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cstdio>
 #include <memory>
 #include <string>
 #include <type_traits>
@@ -41,7 +42,10 @@ class ClientConfig : public testing::Test {
     EXPECT_EQ(client.GetToken(), "");
   }
 
-  void TearDown() override { EXPECT_TRUE(log.isEmpty()); }
+  void TearDown() override {
+    EXPECT_TRUE(log.isEmpty());
+    std::remove(test::configPath(File()).c_str());
+  }
 
   test::Log log;
 };

@@ -16,6 +16,8 @@
 #include "support/clients.h"
 #include "support/faults.h"
 #include "support/log.h"
+#include "support/query.h"
+#include "support/tokens.h"
 
 namespace {
 
@@ -74,6 +76,13 @@ extern "C" int close(int file) {
   return next(file);
 }
 
+extern "C" unsigned char* MD5(const unsigned char* bytes, size_t size, unsigned char* digest) {
+  static auto* const next =
+      Next<unsigned char*(const unsigned char*, size_t, unsigned char*)>("MD5");
+  if (test::failsNow("MD5", __builtin_return_address(0))) return nullptr;
+  return next(bytes, size, digest);
+}
+
 extern "C" ssize_t getrandom(void* bytes, size_t size, unsigned flags) {
   static auto* const next = Next<ssize_t(void*, size_t, unsigned)>("getrandom");
   if (!no_getrandom || !test::isFromLibrary(__builtin_return_address(0)))
@@ -96,6 +105,12 @@ class ClientNonce : public testing::Test {
     std::set<std::string> nonces;
     for (int i = 0; i < 20; ++i) nonces.insert(Nonce());
     EXPECT_EQ(nonces.size(), 20u);
+  }
+
+  void SetUp() override {
+    opened = closed = 0;
+    reads.clear();
+    limited = no_getrandom = false;
   }
 
   void TearDown() override {
@@ -140,6 +155,20 @@ TYPED_TEST(ClientNonce, IsMadeWithoutAnySourceOfRandomness) {
   limit = -1;
   no_getrandom = true;
   EXPECT_EQ(this->Nonce().size(), 36u);
+}
+
+// The digest is empty then, and the request goes on.
+TYPED_TEST(ClientNonce, HasAnEmptyDigestInTheStateWhenThatCannotBeMade) {
+  test::Fault fault("MD5");
+  const std::string url = this->client.GetAccessTokenReqURI(Json::Value());
+  EXPECT_TRUE(fault.wasHit());
+  const std::string state = test::percentDecoded(url.substr(url.find("&state=") + 7));
+  EXPECT_EQ(test::fromBase64(state), "{\"nonce\":\"\"}\n");
+  ASSERT_EQ(this->log.lines().size(), 1u);
+  EXPECT_EQ(this->log.lines()[0].priority, LOG_ERR);
+  EXPECT_EQ(this->log.lines()[0].text.find("utils.cpp:"), 0u);
+  EXPECT_NE(this->log.lines()[0].text.find(" MD5 digest failed "), std::string::npos);
+  this->log.clear();
 }
 
 }  // namespace

@@ -28,6 +28,7 @@ template <typename Provider>
 class ClientPlatform : public testing::Test {
  protected:
   void SetUp() override {
+    platformSpy() = {};
     Json::Value settings;
     for (const char* key : {"authorization_endpoint", "client_id", "client_secret", "redirect_uri"})
       settings[key] = std::string("the ") + key;
@@ -120,6 +121,7 @@ TYPED_TEST(ClientPlatform, SendsValuesAsTheyAreWhenTheyCannotBeEncoded) {
 class AzureUserPlatform : public testing::Test {
  protected:
   AzureUserPlatform() {
+    platformSpy() = {};
     const std::string body = R"({"unique_name":"Alice@corp.example.com"})";
     client.ProcessTokenResponse(R"({"id_token":")" + test::signingInput("{}", body) + R"(.sig"})");
   }
@@ -177,6 +179,8 @@ TEST_F(AzureUserPlatform, FailsWithTheQualifiedNameLeftInPlace) {
 
 class WebSphereKeyPlatform : public testing::Test {
  protected:
+  WebSphereKeyPlatform() { platformSpy() = {}; }
+
   // Verifies a token under the configured secret "s3cret".
   static void Verify(const std::string& header, const std::string& body) {
     test::writeConfig("websphere.conf",

@@ -2,7 +2,6 @@
 #include <gtest/gtest.h>
 #include <openssl/evp.h>
 
-#include <new>
 #include <string>
 
 #include "sso/jwt.h"
@@ -28,6 +27,7 @@ namespace {
 
 using QOVA::JWT::Jwt;
 using QOVA::JWT::jwt_verify_failed;
+using test::failEachNew;
 using test::throws;
 
 // Calls `attempt` with the first, the second, ... allocation failing, until there is no further
@@ -87,26 +87,6 @@ TEST(JwtWithoutMemory, FailsTheHmacCheck) {
   EXPECT_TRUE(log.isEmpty());
 }
 
-// Calls `operation` with the first, the second, ... operator new failing, until none fails.
-// Returns how many there were; each must come out as what it is.
-template <typename Operation>
-int FailEachNew(const Operation& operation) {
-  for (int nth = 1; nth < 1000; ++nth) {
-    bool thrown = false;
-    test::failNew(static_cast<size_t>(nth));
-    try {
-      operation();
-    } catch (const std::bad_alloc&) {
-      thrown = true;
-    }
-    const bool failed = test::newFailed();
-    test::failNew(0);
-    if (!failed) return nth - 1;
-    EXPECT_TRUE(thrown) << "operator new " << nth;
-  }
-  return 1000;
-}
-
 TEST(JwtWithoutMemory, LetsExhaustionPassAndReleasesEverything) {
   test::Log log;
   const test::RsaKey& key = test::anyRsaKey();
@@ -118,12 +98,12 @@ TEST(JwtWithoutMemory, LetsExhaustionPassAndReleasesEverything) {
   std::string secret = test::base64url("secret");
   Jwt rsa_jwt(rsa);
   Jwt hmac_jwt(hmac);
-  EXPECT_GE(FailEachNew([&] { Jwt{rsa}; }), 3);
-  EXPECT_GE(FailEachNew([&] { rsa_jwt.GetHeader(); }), 3);
-  EXPECT_GE(FailEachNew([&] { rsa_jwt.GetBody(); }), 3);
-  EXPECT_EQ(FailEachNew([&] { rsa_jwt.GetSignature(); }), 1);
-  EXPECT_GE(FailEachNew([&] { rsa_jwt.JwtRSAVerify(n, e, EVP_sha256()); }), 1);
-  EXPECT_GE(FailEachNew([&] { hmac_jwt.JwtHMACVerify(secret, EVP_sha256()); }), 1);
+  EXPECT_GE(failEachNew([&] { Jwt{rsa}; }), 3);
+  EXPECT_GE(failEachNew([&] { rsa_jwt.GetHeader(); }), 3);
+  EXPECT_GE(failEachNew([&] { rsa_jwt.GetBody(); }), 3);
+  EXPECT_EQ(failEachNew([&] { rsa_jwt.GetSignature(); }), 1);
+  EXPECT_GE(failEachNew([&] { rsa_jwt.JwtRSAVerify(n, e, EVP_sha256()); }), 1);
+  EXPECT_GE(failEachNew([&] { hmac_jwt.JwtHMACVerify(secret, EVP_sha256()); }), 1);
   EXPECT_TRUE(log.isEmpty());
 }
 

@@ -231,6 +231,17 @@ TEST_F(JwtRsa, RefusesNumbersThatDoNotDecode) {
   log.clear();
 }
 
+TEST_F(JwtRsa, RefusesWhatTheDecoderCannotRead) {
+  for (int nth : {1, 2, 3}) {
+    test::Fault fault("BIO_read", nth);
+    EXPECT_TRUE(
+        throws<jwt_verify_failed>(kRsaFailed, [&] { VerifyRsa(token, kModulus, kExponent); }));
+    EXPECT_TRUE(fault.wasHit());
+  }
+  EXPECT_LE(log.lines().size(), 3u);
+  log.clear();
+}
+
 // The signed text and the numbers are C strings.
 TEST_F(JwtRsa, EndsEachTextAtAZeroByte) {
   const test::RsaKey& key = test::anyRsaKey();

@@ -1,7 +1,10 @@
 // Lets an allocation fail. Link support/memory_spy.cpp into the test program that needs it.
 #pragma once
 
+#include <gtest/gtest.h>
+
 #include <cstddef>
+#include <new>
 
 namespace test {
 
@@ -9,6 +12,26 @@ namespace test {
 void failNew(std::size_t nth);
 // Whether it has come to that since.
 bool newFailed();
+
+// Calls `operation` with the first, the second, ... operator new failing, until none does. Each
+// must come out as std::bad_alloc. Returns how many there were.
+template <typename Operation>
+int failEachNew(const Operation& operation) {
+  for (int nth = 1; nth < 100000; ++nth) {
+    bool thrown = false;
+    failNew(static_cast<std::size_t>(nth));
+    try {
+      operation();
+    } catch (const std::bad_alloc&) {
+      thrown = true;
+    }
+    const bool failed = newFailed();
+    failNew(0);
+    if (!failed) return nth - 1;
+    EXPECT_TRUE(thrown) << "operator new " << nth;
+  }
+  return -1;
+}
 
 // While it lives, calloc of exactly so many bytes (count times size) gives null, errno ENOMEM.
 class FailingCalloc {
