@@ -1,0 +1,17 @@
+// The key set of the Azure client.
+#pragma once
+
+#include <string>
+
+#include "doctor/checkup.h"
+
+namespace doctor {
+
+// Fetches the key set and looks for keys that the library can use. The identifier of one of them;
+// empty if there is none.
+std::string CheckKeySet(Checkup& checkup, const std::string& uri);
+
+// True if the key has texts "n" and "e" that stand for an RSA key.
+bool IsUsableKey(const Json::Value& key);
+
+}  // namespace doctor
