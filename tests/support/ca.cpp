@@ -50,7 +50,9 @@ std::shared_ptr<X509> newCertificate(EVP_PKEY* key, const std::string& subject, 
   const long from = validity == Validity::kExpired  ? -3 * day
                     : validity == Validity::kNotYet ? day
                                                     : -day;
-  const long until = validity == Validity::kExpired ? -day : 3 * day;
+  const long until = validity == Validity::kExpired  ? -day
+                     : validity == Validity::kEnding ? 3 * day
+                                                     : 90 * day;
   X509_set_version(x, 2);
   ASN1_INTEGER_set(X509_get_serialNumber(x), serial++);
   X509_gmtime_adj(X509_getm_notBefore(x), from);

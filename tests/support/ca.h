@@ -16,7 +16,7 @@ struct Identity {
   std::string key;
 };
 
-enum class Validity { kNow, kExpired, kNotYet };
+enum class Validity { kNow, kExpired, kNotYet, kEnding };
 
 class Ca {
  public:

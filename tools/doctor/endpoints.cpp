@@ -251,6 +251,8 @@ void CheckEndpoints(Checkup& checkup) {
   }
   checkup.report.Begin("Network");
   NoteProxy(checkup);
+  // In the order of a login.
+  CheckTokenEndpoint(checkup);
   const Json::Value document = CheckDiscovery(checkup);
   std::string kid;
   if (checkup.provider == Provider::kAzure && document.isObject()) {
@@ -260,7 +262,6 @@ void CheckEndpoints(Checkup& checkup) {
   if (checkup.provider == Provider::kWebSphere || !kid.empty()) {
     CheckAlgorithms(checkup, document, kid);
   }
-  CheckTokenEndpoint(checkup);
 }
 
 }  // namespace doctor

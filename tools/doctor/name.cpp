@@ -56,13 +56,14 @@ void CheckName(Checkup& checkup) {
   if (!reply.result.isString()) return AddRefused(checkup, reply);
   const std::string user = reply.result.asString();
   if (IsUnchanged(name, user)) {
-    checkup.report.Add({"name-unchanged",
-                        Severity::kWarning,
-                        Clip(name, 80),
-                        "becomes " + Quote(Clip(user, 80)) + ", with the DNS domain as it was",
-                        {Said::Does("signs the user in under this name")},
-                        "Build the library with the device's own platform library, unless its "
-                        "users are known by this form."});
+    checkup.report.Add(
+        {"name-unchanged",
+         Severity::kWarning,
+         Clip(name, 80),
+         "becomes " + Quote(Clip(user, 80)) + ", with the DNS domain as it was",
+         {Said::Does("signs the user in under this name")},
+         "Build the library with SSOCLIENT_PLATFORM=winbind or the device's own platform "
+         "library, unless users are known by this form."});
     return;
   }
   checkup.report.Ok("name", Clip(name, 80), "becomes " + Quote(Clip(user, 80)));

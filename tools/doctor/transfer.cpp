@@ -65,6 +65,7 @@ class TransferReport {
             "Install the certificate authorities (package ca-certificates): " + TrustStore() + ".");
         break;
       case CURLE_SSL_CONNECT_ERROR:
+        if (answer.verify_error != X509_V_OK) return AddRefusedCertificate(), false;
         Fail("tls-failed", answer.detail,
              "Look whether the port speaks TLS, and TLS 1.2 or later.");
         break;
@@ -127,10 +128,11 @@ class TransferReport {
       return Fail("tls-not-yet-valid", which + ": valid from " + Time(about->not_before),
                   "Set this device's clock (" + Time(time(nullptr)) + "), or wait.");
     }
+    const bool gap = answer.verify_error == X509_V_ERR_UNABLE_TO_GET_ISSUER_CERT_LOCALLY ||
+                     answer.verify_error == X509_V_ERR_UNABLE_TO_VERIFY_LEAF_SIGNATURE;
     Fail("tls-untrusted", which + ": " + answer.verify_text,
          "Add the certificate authority to " + TrustStore() +
-             (chain.size() == 1 ? ", or let the server send the intermediate certificates too."
-                                : "."));
+             (gap ? ", or let the server send its intermediate certificates." : "."));
   }
 
   void AddGood() {
