@@ -1,6 +1,8 @@
 #include "doctor/report.h"
 
 #include <algorithm>
+#include <cctype>
+#include <cstring>
 #include <iostream>
 
 #include "doctor/json.h"
@@ -11,6 +13,7 @@ namespace doctor {
 namespace {
 
 constexpr size_t kShortestSecret = 4;
+constexpr char kHidden[] = "(hidden)";
 
 struct Name {
   const char* text;
@@ -44,6 +47,20 @@ std::string Line(const Said& said) {
       break;
   }
   return said.text;
+}
+
+// Takes out what looks like a JSON Web Token, whoever wrote it: "eyJ" is how {" begins in base64.
+void HideTokens(std::string& text) {
+  for (size_t at = 0; (at = text.find("eyJ", at)) != std::string::npos;) {
+    size_t end = at;
+    size_t dots = 0;
+    while (end < text.size() && (std::isalnum(static_cast<unsigned char>(text[end])) != 0 ||
+                                 std::strchr("-_.", text[end]) != nullptr)) {
+      if (text[end++] == '.') ++dots;
+    }
+    if (dots >= 2) text.replace(at, end - at, kHidden);
+    at += dots >= 2 ? sizeof kHidden - 1 : 3;
+  }
 }
 
 std::string Plural(size_t count, const std::string& word) {
@@ -91,10 +108,11 @@ int Report::ExitStatus() const {
 std::string Report::Clean(std::string text) const {
   for (const std::string& secret : secrets) {
     for (size_t at = 0; (at = text.find(secret, at)) != std::string::npos;) {
-      text.replace(at, secret.size(), "(hidden)");
-      at += 8;
+      text.replace(at, secret.size(), kHidden);
+      at += sizeof kHidden - 1;
     }
   }
+  HideTokens(text);
   return text;
 }
 
