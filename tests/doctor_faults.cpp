@@ -90,7 +90,7 @@ std::string plainUrl() {
   }
 }
 
-std::vector<Fault> profileFaults() {
+std::vector<SeededFault> profileFaults() {
   const auto text = [](const std::string& content) {
     return [content](Site& site) { site.profileText = content; };
   };
@@ -163,7 +163,7 @@ std::vector<Fault> profileFaults() {
   };
 }
 
-std::vector<Fault> settingsFileFaults() {
+std::vector<SeededFault> settingsFileFaults() {
   const auto text = [](const std::string& content) {
     return [content](Site& site) { site.settingsText = content; };
   };
@@ -238,7 +238,7 @@ std::vector<Fault> settingsFileFaults() {
   };
 }
 
-std::vector<Fault> valueFaults() {
+std::vector<SeededFault> valueFaults() {
   const auto set = [](const char* key, const std::string& value) {
     return [key, value](Site& site) { site.settings[key] = value; };
   };
@@ -311,7 +311,7 @@ std::vector<Fault> valueFaults() {
   };
 }
 
-std::vector<Fault> identityFaults() {
+std::vector<SeededFault> identityFaults() {
   const auto program = [](mode_t mode, uid_t owner) {
     return [mode, owner](Site& site) {
       makeFile("/usr/qova/login.cgi", 0700);
@@ -361,7 +361,7 @@ std::vector<Fault> identityFaults() {
   };
 }
 
-std::vector<Fault> networkFaults() {
+std::vector<SeededFault> networkFaults() {
   constexpr char kRefused[] =
       "request token uri SSL peer certificate or SSH remote key was not OK.";
   const std::string store = "Add the certificate authority to";
@@ -474,7 +474,7 @@ std::vector<Fault> networkFaults() {
   };
 }
 
-std::vector<Fault> answerFaults() {
+std::vector<SeededFault> answerFaults() {
   const auto answer = [](const char* path, Answer given) {
     return [path, given](Site& site) { site.answers[path] = given; };
   };
@@ -608,7 +608,7 @@ std::vector<Fault> answerFaults() {
   };
 }
 
-std::vector<Fault> clockFaults() {
+std::vector<SeededFault> clockFaults() {
   return {
       {"ClockAhead",
        [](Site& s) {
@@ -630,7 +630,7 @@ std::vector<Fault> clockFaults() {
   };
 }
 
-std::vector<Fault> nameFaults() {
+std::vector<SeededFault> nameFaults() {
   const auto name = [](const std::string& value, bool directory) {
     return [value, directory](Site& site) {
       site.arguments = {"--offline", "--timeout", "2", "--name", value};
@@ -650,7 +650,7 @@ std::vector<Fault> nameFaults() {
   };
 }
 
-std::vector<Fault> azureTokenFaults() {
+std::vector<SeededFault> azureTokenFaults() {
   const auto token = [](const std::function<void(Site&)>& change) {
     return [change](Site& site) {
       site.passToken = true;
@@ -735,14 +735,14 @@ std::vector<Fault> azureTokenFaults() {
   };
 }
 
-std::vector<Fault> webSphereTokenFaults() {
+std::vector<SeededFault> webSphereTokenFaults() {
   const auto token = [](const std::function<void(Site&)>& change) {
     return [change](Site& site) {
       site.passToken = true;
       change(site);
     };
   };
-  std::vector<Fault> faults = {
+  std::vector<SeededFault> faults = {
       {"HmacOfAnotherSecret", token([](Site& s) {
          s.token = hmacToken("of another", compact(s.header), compact(s.claims));
        }),
@@ -761,14 +761,14 @@ std::vector<Fault> webSphereTokenFaults() {
        token([](Site& s) { s.claims["aud"] = "7C1B2A3D-4E5F-4A6B-8C7D-9E0F1A2B3C4D"; }),
        "token-audience", "failure", "client ID invalid", "Set the client ID", 1, Proof::kSameWords},
   };
-  for (Fault& fault : faults) fault.azure = false;
+  for (SeededFault& fault : faults) fault.azure = false;
   return faults;
 }
 
 }  // namespace
 
-std::vector<Fault> allFaults() {
-  std::vector<Fault> all;
+std::vector<SeededFault> allFaults() {
+  std::vector<SeededFault> all;
   for (const auto& group :
        {profileFaults(), settingsFileFaults(), valueFaults(), identityFaults(), networkFaults(),
         answerFaults(), clockFaults(), nameFaults(), azureTokenFaults(), webSphereTokenFaults()}) {

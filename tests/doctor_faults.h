@@ -18,7 +18,7 @@ enum class Proof {
   kNone,       // the fault shows at the provider, in the browser, or in another program
 };
 
-struct Fault {
+struct SeededFault {
   std::string name;
   std::function<void(Site&)> seed;
   std::string id;
@@ -32,10 +32,10 @@ struct Fault {
   std::string seen = "";  // a part of it
 };
 
-inline std::ostream& operator<<(std::ostream& out, const Fault& fault) {
+inline std::ostream& operator<<(std::ostream& out, const SeededFault& fault) {
   return out << fault.name;
 }
 
-std::vector<Fault> allFaults();
+std::vector<SeededFault> allFaults();
 
 }  // namespace test

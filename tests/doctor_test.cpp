@@ -10,9 +10,9 @@
 
 namespace {
 
-using test::Fault;
 using test::Outcome;
 using test::Proof;
+using test::SeededFault;
 using test::Site;
 
 // The texts of one kind ("throws", "logs") that a finding quotes.
@@ -49,7 +49,7 @@ void expectNoSecret(const Site& site, const Outcome& run) {
 }
 
 // The library, asked directly, on the same seed.
-void expectProof(const Fault& fault, Site& site, const Json::Value& finding) {
+void expectProof(const SeededFault& fault, Site& site, const Json::Value& finding) {
   if (fault.proof == Proof::kNone) return;
   site.deploy(true);
   const test::Login login = test::logIn(fault.caller);
@@ -77,10 +77,10 @@ void expectProof(const Fault& fault, Site& site, const Json::Value& finding) {
   }
 }
 
-class DoctorFinds : public testing::TestWithParam<Fault> {};
+class DoctorFinds : public testing::TestWithParam<SeededFault> {};
 
 TEST_P(DoctorFinds, TheFault) {
-  const Fault& fault = GetParam();
+  const SeededFault& fault = GetParam();
   Site site(fault.azure);
   fault.seed(site);
   site.deploy(false);
