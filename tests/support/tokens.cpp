@@ -3,9 +3,11 @@
 #include <openssl/bn.h>
 #include <openssl/core_names.h>
 #include <openssl/hmac.h>
+#include <openssl/pem.h>
 #include <openssl/rsa.h>
 
 #include <stdexcept>
+#include <utility>
 #include <vector>
 
 namespace test {
@@ -23,6 +25,12 @@ const EVP_MD* digestNamed(const std::string& name) {
   const EVP_MD* digest = EVP_get_digestbyname(name.c_str());
   require(digest != nullptr, "unknown digest");
   return digest;
+}
+
+std::shared_ptr<EVP_PKEY> readKey(const char* path) {
+  const std::unique_ptr<BIO, decltype(&BIO_free)> file(BIO_new_file(path, "r"), BIO_free);
+  require(file != nullptr, "cannot open the key");
+  return {PEM_read_bio_PrivateKey(file.get(), nullptr, nullptr, nullptr), EVP_PKEY_free};
 }
 
 std::string digestOf(const std::string& algorithm) {
@@ -58,6 +66,10 @@ std::string fromBase64(const std::string& text) {
   require(size >= 0, "not base64");
   bytes.resize(static_cast<std::size_t>(size) - missing);
   return bytes;
+}
+
+RsaKey::RsaKey(std::shared_ptr<EVP_PKEY> pair) : key(std::move(pair)) {
+  require(key != nullptr, "no RSA key");
 }
 
 RsaKey::RsaKey(int bits) : key(EVP_RSA_gen(static_cast<unsigned>(bits)), EVP_PKEY_free) {
@@ -102,7 +114,7 @@ std::string RsaKey::sign(const std::string& data, const std::string& digest) con
 }
 
 const RsaKey& anyRsaKey() {
-  static const RsaKey key;
+  static const RsaKey key(readKey(RSA_KEY));
   return key;
 }
 

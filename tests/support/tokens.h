@@ -15,6 +15,7 @@ std::string fromBase64(const std::string& text);  // either alphabet, padded or 
 class RsaKey {
  public:
   explicit RsaKey(int bits = 2048);
+  explicit RsaKey(std::shared_ptr<EVP_PKEY> pair);
 
   std::string n() const;  // base64url, as in a JSON Web Key
   std::string e() const;
@@ -29,7 +30,8 @@ class RsaKey {
   std::shared_ptr<EVP_PKEY> key;
 };
 
-// One key for all tests that do not care which: making one takes a while.
+// One key of 2048 bits for all tests that do not care which: making one takes a while, so the
+// build does it.
 const RsaKey& anyRsaKey();
 
 std::string hmac(const std::string& secret, const std::string& data, const std::string& digest);
