@@ -28,7 +28,8 @@ int change(const char* name, unsigned real, unsigned effective, unsigned saved) 
     spy->all.push_back(std::string(name) + "(" + number(real) + ", " + number(effective) + ", " +
                        number(saved) + ")");
     spy->changes.push_back(spy->all.back());
-    if (spy->changes.size() == spy->failing) {
+    const std::size_t count = spy->changes.size();
+    if (count == spy->failing || (spy->allAfter && count > spy->failing)) {
       errno = spy->error;
       return -1;
     }

@@ -24,6 +24,7 @@ class IdsSpy {
   // The failing-th change (counted from 1) is not carried out; it fails with this errno.
   std::size_t failing = 0;
   int error = 0;
+  bool allAfter = false;  // so do all changes after it
   // Called after the given change was carried out.
   std::function<void(std::size_t change)> afterwards;
 
