@@ -222,6 +222,7 @@ Outcome observe(const Unit& unit, const Plan& plan) {
   spy.allAfter = plan.allAfter;
   spy.error = plan.error;
   test::Log log;
+  log.spoilErrno();
   watched = &spy;
   errno = 77;
   seen.value = unit.read();

@@ -9,6 +9,8 @@
 
 namespace {
 
+bool spoils = false;
+
 std::vector<test::LogLine>& recorded() {
   static std::vector<test::LogLine> lines;
   return lines;
@@ -29,7 +31,7 @@ void record(int priority, const char* format, va_list arguments) {
   va_end(again);
   text.pop_back();
   recorded().push_back({priority, text, error});
-  errno = error;
+  errno = spoils ? EOVERFLOW : error;
 }
 
 }  // namespace
@@ -69,6 +71,14 @@ namespace test {
 
 Log::Log() {
   clear();
+}
+
+Log::~Log() {
+  spoils = false;
+}
+
+void Log::spoilErrno() {
+  spoils = true;
 }
 
 void Log::clear() {

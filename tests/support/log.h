@@ -27,6 +27,12 @@ struct Expected {
 class Log {
  public:
   Log();
+  ~Log();
+  Log(const Log&) = delete;
+  Log& operator=(const Log&) = delete;
+
+  // From now on errno is another one after each line, as the real calls may leave it.
+  void spoilErrno();
 
   const std::vector<LogLine>& lines() const;
   void clear();
