@@ -1,0 +1,536 @@
+// Runs every operation of the library with each allocation, and each call that can fail, failing
+// once: alone, and with all that follow. After each run: the outcome is one of those laid down,
+// nothing was kept (memory, descriptors), the process ids are what the guard leaves, and the
+// system log holds the library's own lines alone. Operations are run in processes of their own.
+//   torture_test [--every N] [--list] [NAME...]
+// NAME limits it to operations that begin so; --every N takes every N-th injection of those that
+// talk TLS, and of those in fresh processes.
+#include <curl/curl.h>
+#include <cxxabi.h>
+#include <dirent.h>
+#include <dlfcn.h>
+#include <execinfo.h>
+#include <sys/mman.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <csignal>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <ctime>
+#include <map>
+#include <set>
+#include <stdexcept>
+#include <typeinfo>
+
+#include "support/busy.h"
+#include "support/device.h"
+#include "support/log.h"
+#include "torture/exports.h"
+#include "torture/operation.h"
+
+namespace torture {
+namespace {
+
+constexpr unsigned kUser = 1001;
+constexpr unsigned kGroup = 2002;
+constexpr int kSlice = 40;          // seconds that one process runs; the provider lives for 100
+constexpr long kMostRuns = 200000;  // of one operation
+
+long every = 1;
+
+// What a child process tells its parent, and where it was when it died.
+struct Report {
+  Plan next;  // where to go on
+  bool finished;
+  bool cold;
+  long passed;
+  long failed;
+  long once;        // runs that kept memory, and kept none when they were repeated: caches
+  long foreign;     // crashes of a library underneath that are known
+  char crash[300];  // where the last process crashed
+  char owners[600];
+  char text[4000];
+  Called called[64];
+};
+Report* report = nullptr;
+
+void complain(const std::string& text) {
+  const std::size_t used = std::strlen(report->text);
+  std::snprintf(report->text + used, sizeof report->text - used, "%s\n", text.c_str());
+}
+
+bool matches(const std::string& outcome, const std::string& pattern) {
+  if (!pattern.empty() && pattern.back() == '*') {
+    return outcome.compare(0, pattern.size() - 1, pattern, 0, pattern.size() - 1) == 0;
+  }
+  return outcome == pattern;
+}
+
+bool anyMatches(const std::string& outcome, const Outcomes& patterns) {
+  return std::any_of(patterns.begin(), patterns.end(),
+                     [&](const std::string& pattern) { return matches(outcome, pattern); });
+}
+
+std::string textOf(const Plan& plan, const char* name) {
+  return std::string(plan.kind == Kind::kMemory ? "allocation " : "call ") +
+         std::to_string(plan.nth) + (plan.allAfter ? " and all after it" : "") + " (" + name + ")";
+}
+
+// The outcome is laid down for the function that failed; when more than one kind of function
+// failed, for any of them.
+bool isLaidDown(const Operation& operation, const Plan& plan, const Seen& what,
+                const std::string& outcome) {
+  if (!what.hit) return matches(outcome, operation.good);
+  if (plan.kind == Kind::kMemory) {
+    const auto found = operation.on.find("memory");
+    return matches(outcome, operation.good) || matches(outcome, "std::bad_alloc: *") ||
+           (found != operation.on.end() && anyMatches(outcome, found->second));
+  }
+  const auto found = operation.on.find(what.name);
+  if (!plan.allAfter) {
+    return found == operation.on.end() ? matches(outcome, operation.good)
+                                       : anyMatches(outcome, found->second);
+  }
+  return matches(outcome, operation.good) ||
+         std::any_of(operation.on.begin(), operation.on.end(), [&](const auto& each) {
+           return each.first != "memory" && anyMatches(outcome, each.second);
+         });
+}
+
+// --- the system log
+
+const char* const kOwnLines[] = {"bad_alloc. ",
+                                 "bad wellknown json format.",
+                                 "no kyes information",
+                                 "request token uri ",
+                                 "request wellknown uri ",
+                                 "curl_easy_init failed. ",
+                                 "MD5 digest failed ",
+                                 "calloc failed. ",
+                                 "EVP_PKEY_assign_RSA failed",
+                                 "check key type failed",
+                                 "EVP_DigestVerifyInit failed",
+                                 "EVP_DigestVerifyUpdate failed",
+                                 "EVP_DigestVerifyFinal failed",
+                                 "Profile 'another' not support",
+                                 "WARNING: setres",
+                                 "ERROR: setres",
+                                 "ERROR: ENTERCriticalSection",
+                                 "ERROR: LEAVECriticalSection"};
+
+// The line that must be there when this function failed.
+const std::map<std::string, std::string>& mustLog() {
+  static const std::map<std::string, std::string> lines = {
+      {"EVP_PKEY_assign", "EVP_PKEY_assign_RSA failed"},
+      {"EVP_PKEY_get_id", "check key type failed"},
+      {"EVP_DigestVerifyInit", "EVP_DigestVerifyInit failed"},
+      {"EVP_DigestUpdate", "EVP_DigestVerifyUpdate failed"},
+      {"EVP_DigestVerifyFinal", "EVP_DigestVerifyFinal failed"},
+      {"MD5", "MD5 digest failed "},
+      {"setresuid", "ERROR: setresuid("},
+      {"setresgid", "ERROR: setresgid("}};
+  return lines;
+}
+
+bool isOwnLine(const std::string& message) {
+  for (const char* const start : kOwnLines) {
+    if (message.compare(0, std::strlen(start), start) == 0) return true;
+  }
+  for (int code = 1; code < CURL_LAST; ++code) {
+    if (message == curl_easy_strerror(static_cast<CURLcode>(code))) return true;
+  }
+  return false;
+}
+
+void checkLog(const test::Log& log, const Plan& plan, const Seen& what, Run* run) {
+  const auto wanted = mustLog().find(what.name);
+  bool found = !what.hit || plan.kind == Kind::kMemory || wanted == mustLog().end();
+  for (const test::LogLine& line : log.lines()) {
+    const std::string message =
+        line.text.substr(std::min(line.text.find(' '), line.text.size() - 1) + 1);
+    run->expect(isOwnLine(message), "a strange line in the log: " + line.text);
+    found = found || message.compare(0, wanted->second.size(), wanted->second) == 0;
+  }
+  run->expect(found, "the log does not say that " + std::string(what.name) + " failed");
+}
+
+// --- process ids
+
+struct EffectiveIds {
+  unsigned user;
+  unsigned group;
+};
+
+// What the guard leaves. Its changes are, in the usual case: group up, user up, user up again,
+// group back, user back; the ids depend on which of them failed. An exception between its halves
+// leaves the ids raised.
+EffectiveIds expectedIds(const Plan& plan, const Seen& what) {
+  const EffectiveIds own = {kUser, kGroup};
+  if (what.idsChange == 0) return what.looks % 2 == 0 ? own : EffectiveIds{0, 0};
+  switch ((what.idsChange - 1) % 5 + 1) {
+    case 2:
+      return plan.allAfter ? EffectiveIds{kUser, 0} : own;
+    case 3:
+      return {0, 0};
+    case 4:
+      return {0, 0};
+    case 5:
+      return {0, kGroup};
+    default:
+      return own;
+  }
+}
+
+void checkIds(const Plan& plan, const Seen& what, Run* run) {
+  const EffectiveIds expected = expectedIds(plan, what);
+  run->expect(geteuid() == expected.user && getegid() == expected.group,
+              "the ids are " + std::to_string(geteuid()) + "/" + std::to_string(getegid()) +
+                  " instead of " + std::to_string(expected.user) + "/" +
+                  std::to_string(expected.group));
+  const unsigned keep = static_cast<unsigned>(-1);
+  if (setresuid(keep, 0, keep) != 0 || setresgid(keep, kGroup, keep) != 0 ||
+      setresuid(keep, kUser, keep) != 0) {
+    abort();
+  }
+}
+
+int openDescriptors() {
+  DIR* const folder = opendir("/proc/self/fd");
+  int count = 0;
+  while (readdir(folder) != nullptr) ++count;
+  closedir(folder);
+  return count;
+}
+
+// --- runs
+
+// One run; true if it was as it should be. `more` blocks of memory stay behind it.
+bool runOnce(const Operation& operation, const Plan& plan, bool* hit, long* more) {
+  Run run(plan);
+  const long kept_before = kept().blocks;
+  const int before = openDescriptors();
+  test::Log log;
+  operation.body(run);
+  const Seen what = seen();
+  *more = kept().blocks - kept_before;
+  checkLog(log, plan, what, &run);
+  checkIds(plan, what, &run);
+  log.clear();
+  run.expect(openDescriptors() == before, "a descriptor is left open");
+  run.expect(isLaidDown(operation, plan, what, run.outcome()),
+             "the outcome is \"" + run.outcome() + "\"");
+  *hit = what.hit;
+  if (run.complaints().empty()) return true;
+  complain("  " + operation.name + ", " + textOf(plan, what.name) + ":\n" + run.complaints());
+  return false;
+}
+
+void addOwner(const std::string& owner) {
+  const std::string name = " " + owner.substr(owner.rfind('/') + 1);
+  if (std::strstr(report->owners, name.c_str()) != nullptr) return;
+  const std::size_t used = std::strlen(report->owners);
+  std::snprintf(report->owners + used, sizeof report->owners - used, "%s", name.c_str());
+}
+
+// Whether memory stays behind every time. A cache is filled once; OpenSSL's queue of errors has
+// room for 16, each with texts.
+bool leaks(const Operation& operation, const Plan& plan) {
+  const std::string owner = kept().owner;
+  long more = 0;
+  for (int again = 0; again < 20; ++again) {
+    bool hit = false;
+    runOnce(operation, plan, &hit, &more);
+    if (more > 0) continue;
+    ++report->once;
+    addOwner(owner);
+    return false;
+  }
+  complain("  " + operation.name + ", " + textOf(plan, seen().name) + ": " + std::to_string(more) +
+           " blocks of memory stay, of " + owner);
+  return true;
+}
+
+// The plan after this one; false when that was the last.
+bool advance(const Operation& operation, bool hit, Plan* plan) {
+  const long step = report->cold || operation.server == Operation::Server::kTls ? every : 1;
+  plan->nth += step;
+  if (hit) return true;
+  plan->nth = 1;
+  if (!plan->allAfter) {
+    plan->allAfter = true;
+  } else if (plan->kind == Kind::kMemory) {
+    *plan = {Kind::kCall, 1, false};
+  } else {
+    return false;
+  }
+  return true;
+}
+
+void warmUp(const Operation& operation) {
+  long more = 0;
+  for (int i = 0; i < 20; ++i) {
+    bool hit = false;
+    if (!runOnce(operation, {Kind::kMemory, 0, false}, &hit, &more)) ++report->failed;
+  }
+  if (more > 0) {
+    ++report->failed;
+    complain("  " + operation.name + ": keeps memory, of " + kept().owner);
+  }
+}
+
+void count(bool good, bool hit) {
+  if (!good) {
+    ++report->failed;
+  } else if (hit) {  // otherwise there are no more calls: nothing was injected
+    ++report->passed;
+  }
+}
+
+// As many plans as fit into a slice of time.
+void runWarm(const Operation& operation) {
+  const time_t start = time(nullptr);
+  warmUp(operation);
+  while (report->failed < 5 && report->passed < kMostRuns && time(nullptr) - start < kSlice) {
+    bool hit = false;
+    long more = 0;
+    const Plan plan = report->next;
+    bool good = runOnce(operation, plan, &hit, &more);
+    if (good && more > 0) good = !leaks(operation, plan);
+    count(good, hit);
+    if (advance(operation, hit, &report->next)) continue;
+    report->finished = true;
+    return;
+  }
+}
+
+// One plan, in a process in which the libraries have done nothing yet. What they set up for
+// good is not told apart from what they lose, so memory is not looked at.
+void runCold(const Operation& operation) {
+  bool hit = false;
+  long more = 0;
+  const bool good = runOnce(operation, report->next, &hit, &more);
+  count(good, hit);
+  report->finished = !advance(operation, hit, &report->next);
+}
+
+// OpenSSL 3.0 does not look whether the parts of its own context came into being: asked for random
+// bytes without them, it locks what is not there. Only a process in which nothing has used OpenSSL
+// before can get there, and no caller of OpenSSL can help it.
+const char* const kKnownCrashes[] = {"libcrypto.so.3 RAND_get0_primary"};
+
+// Notes where a process crashed, the frames of the system's and the test's own left out; the
+// process ends as it would have.
+void noteCrash(int number) {
+  const test::Busy busy;
+  void* frames[40];
+  const int depth = backtrace(frames, 40);
+  for (int i = 0; i < depth; ++i) {
+    Dl_info info;
+    if (dladdr(frames[i], &info) == 0) continue;
+    const char* const slash = std::strrchr(info.dli_fname, '/');
+    const char* const file = slash != nullptr ? slash + 1 : info.dli_fname;
+    if (std::strcmp(file, "libc.so.6") == 0 || std::strcmp(file, "torture_test") == 0) continue;
+    const std::size_t used = std::strlen(report->crash);
+    std::snprintf(report->crash + used, sizeof report->crash - used, ", %s %s", file,
+                  info.dli_sname != nullptr ? info.dli_sname : "?");
+  }
+  std::signal(number, SIG_DFL);
+  raise(number);
+}
+
+bool isKnownCrash() {
+  const std::string where = report->crash;
+  return report->cold &&
+         std::any_of(std::begin(kKnownCrashes), std::end(kKnownCrashes), [&](const char* known) {
+           return where.substr(0, where.find("libcurl")).find(known) != std::string::npos;
+         });
+}
+
+void watchForCrashes() {
+  void* frames[1];
+  backtrace(frames, 1);  // loads what it needs
+  std::signal(SIGSEGV, noteCrash);
+  std::signal(SIGABRT, noteCrash);
+}
+
+[[noreturn]] void child(const Operation& operation) {
+  watchForCrashes();
+  if (setresgid(kGroup, kGroup, 0) != 0 || setresuid(kUser, kUser, 0) != 0) _exit(2);
+  alarm(90);
+  report->cold ? runCold(operation) : runWarm(operation);
+  const auto called = calledSoFar();
+  for (const Called& each : called) {
+    for (Called& known : report->called) {
+      if (known.name != nullptr && known.name != each.name) continue;
+      known.name = each.name;
+      known.times += each.times;
+      break;
+    }
+  }
+  std::fflush(nullptr);
+  leaveProvider();
+  if (setresuid(0, 0, 0) == 0 && setresgid(0, 0, 0) == 0) exit(0);  // keeps coverage counts
+  _exit(0);
+}
+
+// A process that did not end by itself.
+void noteEnd(const Operation& operation, int status) {
+  if (isKnownCrash()) {
+    ++report->foreign;
+    return;
+  }
+  ++report->failed;
+  complain("  " + operation.name + (report->cold ? " [fresh]" : "") + ": ended by " +
+           (WIFSIGNALED(status) ? "signal " + std::to_string(WTERMSIG(status))
+                                : "status " + std::to_string(WEXITSTATUS(status))) +
+           (report->cold ? " at " : " after ") + textOf(report->next, "?") + report->crash);
+}
+
+// Runs the operation to the end, in one process after the other.
+void runAll(const Operation& operation, bool cold) {
+  report->next = {Kind::kMemory, 1, false};
+  report->finished = false;
+  report->cold = cold;
+  const long failedBefore = report->failed;
+  time_t started = 0;
+  while (!report->finished && report->failed < failedBefore + 5) {
+    if (time(nullptr) - started > (cold ? kSlice : 0)) {
+      startProvider(operation.server);
+      if (operation.configure) operation.configure();
+      started = time(nullptr);
+    }
+    std::fflush(nullptr);
+    report->crash[0] = '\0';
+    const pid_t process = fork();
+    if (process == 0) child(operation);
+    int status = 0;
+    waitpid(process, &status, 0);
+    if (status == 0) continue;
+    noteEnd(operation, status);
+    bool hit = true;
+    if (!advance(operation, hit, &report->next)) break;
+  }
+  stopProvider();
+}
+
+struct Totals {
+  long passed = 0;
+  long failed = 0;
+  long foreign = 0;
+  std::set<std::string> owners;
+};
+
+void runOperation(const Operation& operation, bool cold, Totals* totals) {
+  report->passed = report->failed = report->once = report->foreign = 0;
+  report->text[0] = report->owners[0] = '\0';
+  runAll(operation, cold);
+  std::printf("%7ld of %7ld  %s%s\n%s", report->passed, report->passed + report->failed,
+              operation.name.c_str(), cold ? " [fresh processes]" : "", report->text);
+  std::fflush(stdout);
+  if (report->passed + report->failed == 0) {
+    static const std::set<std::string> kNothing = {
+        "SSOClient::isEnable",       "SSOClient::GetToken",     "SSOClient::SetCode",
+        "SSOClient::SetRedirectURI", "SSOProfile::SSOIsEnable", "SSOProfile::GetSSOProfile",
+        "SSOProfile::GetSSOClient"};  // they take no memory and call nobody
+    if (kNothing.count(operation.name) == 0) {
+      std::printf("  %s: nothing was injected\n", operation.name.c_str());
+      ++totals->failed;
+    }
+  }
+  totals->foreign += report->foreign;
+  totals->passed += report->passed;
+  totals->failed += report->failed;
+  const std::string owners = report->owners;
+  for (std::size_t at = 0; at < owners.size();) {
+    const std::size_t end = std::min(owners.find(' ', at + 1), owners.size());
+    totals->owners.insert(owners.substr(at + 1, end - at - 1));
+    at = end;
+  }
+}
+
+void printTotals(const Totals& totals) {
+  std::printf("calls seen while something could fail:");
+  for (const Called& each : report->called) {
+    if (each.name != nullptr) std::printf(" %s %ld", each.name, each.times);
+  }
+  std::printf("\nmemory kept once and not again, of:");
+  for (const std::string& owner : totals.owners) std::printf(" %s", owner.c_str());
+  std::printf("\nfresh processes that OpenSSL itself crashed for want of memory: %ld\n",
+              totals.foreign);
+  std::printf("%ld passed, %ld failed\n", totals.passed, totals.failed);
+}
+
+void compare(const char* what, const Compared& compared, Totals* totals) {
+  const long missing = static_cast<long>(compared.missing.size());
+  std::printf("%7ld of %7ld  %s of the library are dealt with\n", compared.all - missing,
+              compared.all, what);
+  for (const std::string& name : compared.missing) std::printf("  not: %s\n", name.c_str());
+  totals->passed += compared.all - missing;
+  totals->failed += missing + (compared.all == 0 ? 1 : 0);
+}
+
+int torture(const std::vector<std::string>& names) {
+  test::requireSandbox();
+  prepare();
+  report = static_cast<Report*>(
+      mmap(nullptr, sizeof *report, PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0));
+  makeFixtures();
+  Totals totals;
+  std::set<std::string> covered;
+  for (const Operation& operation : operations()) {
+    covered.insert(operation.name.substr(0, operation.name.find(',')));
+    const bool wanted =
+        names.empty() || std::any_of(names.begin(), names.end(), [&](const std::string& name) {
+          return operation.name.compare(0, name.size(), name) == 0;
+        });
+    if (!wanted) continue;
+    runOperation(operation, false, &totals);
+    if (operation.cold) runOperation(operation, true, &totals);
+  }
+  compare("exports", compareExports(covered), &totals);
+  compare("imports", compareImports(), &totals);
+  printTotals(totals);
+  return totals.failed == 0 ? 0 : 1;
+}
+
+}  // namespace
+
+void Run::armed(const std::function<void()>& call) {
+  const Armed now(plan);
+  try {
+    call();
+    back = true;
+    result = "ok";
+  } catch (const std::exception& e) {
+    const test::Busy busy;
+    int status = 0;
+    char* const name = abi::__cxa_demangle(typeid(e).name(), nullptr, nullptr, &status);
+    result = std::string(name) + ": " + e.what();
+    std::free(name);
+  }
+}
+
+void Run::gave(const std::string& text) {
+  result = "ok: " + text;
+}
+
+void Run::expect(bool good, const std::string& what) {
+  if (!good) wrong += "    " + what + "\n";
+}
+
+}  // namespace torture
+
+int main(int argc, char** argv) {
+  std::vector<std::string> names;
+  for (int i = 1; i < argc; ++i) {
+    if (std::strcmp(argv[i], "--every") == 0 && i + 1 < argc) {
+      torture::every = std::max(1L, std::atol(argv[++i]));
+    } else {
+      names.emplace_back(argv[i]);
+    }
+  }
+  return torture::torture(names);
+}
