@@ -76,7 +76,7 @@ class Bench : public testing::Test {
     settings["wellknown"] = address("discovery");
     configure<Provider>(settings);
     writeConfig("discovery", "{\"issuer\":\"x\",\"jwks_uri\":\"" + address("keys") + "\"}");
-    publish(anyRsaKey().jwk("the key"));
+    if (Provider::name() == "azure") publish(anyRsaKey().jwk("the key"));
   }
 
   static std::string address(const std::string& file) { return "file://" + configPath(file); }

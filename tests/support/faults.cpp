@@ -52,8 +52,9 @@ bool failsNow(const char* function, const void* caller) {
 }  // namespace test
 
 // FAULTY(RESULT, NAME, PARAMETERS, ARGUMENTS, FAILED): stands before the function of that name.
+// Weak, so that a test program may have one of its own instead.
 #define FAULTY(RESULT, NAME, PARAMETERS, ARGUMENTS, FAILED)                  \
-  extern "C" RESULT NAME PARAMETERS {                                        \
+  extern "C" __attribute__((weak)) RESULT NAME PARAMETERS {                  \
     static auto* const next = real<RESULT PARAMETERS>(#NAME);                \
     if (test::failsNow(#NAME, __builtin_return_address(0))) return (FAILED); \
     return next ARGUMENTS;                                                   \
