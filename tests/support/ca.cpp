@@ -151,4 +151,11 @@ void Ca::trust() const {
   coverFile(path, bundle.str() + "\n" + certificate());
 }
 
+void Ca::trustAlone() const {
+  requireSandbox();
+  const std::string path = bundlePath();
+  provideBundle(path);
+  coverFile(path, certificate());
+}
+
 }  // namespace test
