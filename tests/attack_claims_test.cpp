@@ -116,6 +116,11 @@ TYPED_TEST(AttackClaims, EndAtAZeroByteOfTheToken) {
       "basic_string: construction from null is not valid", zero + good));
 }
 
+// Whether the clock can show it: on some devices it ends in 2038.
+bool isTime(std::int64_t seconds) {
+  return static_cast<std::time_t>(seconds) == seconds;
+}
+
 // At the second `now`: a token is good until the second of its expiry is over.
 TYPED_TEST(AttackClaims, ExpireAtTheirSecondHoweverFarItIs) {
   const std::vector<std::int64_t> edges = {1,
@@ -139,11 +144,12 @@ TYPED_TEST(AttackClaims, ExpireAtTheirSecondHoweverFarItIs) {
                                      "\" +" + text + "\"", "\"0000" + text + "\""}) {
       const std::string token = this->withBody(body(spelt));
       for (const std::int64_t now : {exp - 1, exp}) {
-        const test::Clock clock(now);
+        if (!isTime(now)) continue;
+        const test::Clock clock(static_cast<std::time_t>(now));
         EXPECT_TRUE(this->accepts(token)) << spelt << " at " << now;
       }
-      if (exp == std::numeric_limits<std::int64_t>::max()) continue;
-      const test::Clock clock(exp + 1);
+      if (exp == std::numeric_limits<std::int64_t>::max() || !isTime(exp + 1)) continue;
+      const test::Clock clock(static_cast<std::time_t>(exp + 1));
       EXPECT_TRUE(this->invalid(kExpired, token)) << spelt;
     }
   }

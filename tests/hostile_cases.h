@@ -15,7 +15,7 @@ namespace hostile {
 // What honest answers are made of. Made once, before the server starts.
 struct World {
   std::string base;  // the provider's address, without a path
-  test::RsaKey key;
+  test::RsaKey key = test::anyRsaKey();
   test::RsaKey foreign;
   std::string secret = "s3cret of the device";
   int closedPort = 1;
