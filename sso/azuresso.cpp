@@ -1,6 +1,5 @@
 #include "sso/azuresso.h"
 
-#include <curl/curl.h>
 #include <openssl/evp.h>
 #include <syslog.h>
 
@@ -13,6 +12,7 @@
 #include "sso/http_body.h"
 #include "sso/json.h"
 #include "sso/jwt.h"
+#include "sso/libcurl.h"
 #include "sso/privilege.h"
 #include "sso/provider.h"
 #include "sso/split.h"
@@ -129,7 +129,7 @@ void AzureSSOClient::RequestKeysInfo(std::string uri, Json::Value& keys) {
     syslog(LOG_ERR, "%s:%d request wellknown uri %s.", kUnit, __LINE__, e.what());
   }
   // httpGet has done this already; once more does no harm.
-  curl_global_cleanup();
+  CleanUpCurl();
 }
 
 void AzureSSOClient::VerifyIDToken() {

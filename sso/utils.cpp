@@ -3,7 +3,6 @@
 
 #include "sso/utils.h"
 
-#include <curl/curl.h>
 #include <fcntl.h>
 #include <json/reader.h>
 #include <json/writer.h>
@@ -16,6 +15,7 @@
 
 #include "platform/platform.h"
 #include "sso/json.h"
+#include "sso/libcurl.h"
 #include "sso/owned.h"
 
 namespace QOVA {
@@ -28,11 +28,15 @@ constexpr char kUnit[] = "utils.cpp";
 using WriteFunction = unsigned (*)(void* data, unsigned size, unsigned count, void* userData);
 
 // libcurl's state, set up and torn down around every transfer.
-struct CurlState {
-  CurlState() { curl_global_init(CURL_GLOBAL_ALL); }
-  ~CurlState() { curl_global_cleanup(); }
+class CurlState {
+ public:
+  explicit CurlState(const Curl& library) : curl(library) { curl.global_init(CURL_GLOBAL_ALL); }
+  ~CurlState() { curl.global_cleanup(); }
   CurlState(const CurlState&) = delete;
   CurlState& operator=(const CurlState&) = delete;
+
+ private:
+  const Curl& curl;
 };
 
 // libcurl's type has size_t where ours has unsigned. It passes at most its own buffer's size, and
@@ -44,22 +48,24 @@ curl_write_callback CurlFunction(WriteFunction writeFn) {
 // A POST of `body`, or a GET if it is null.
 void Transfer(const std::string& url, const std::string* body, std::string& response,
               bool verifySSL, WriteFunction writeFn) {
-  const CurlState state;
-  const std::unique_ptr<CURL, Releaser<curl_easy_cleanup>> owner(curl_easy_init());
+  const Curl& curl = LoadCurl();
+  const CurlState state(curl);
+  const std::unique_ptr<CURL, decltype(curl.easy_cleanup)> owner(curl.easy_init(),
+                                                                 curl.easy_cleanup);
   CURL* const handle = owner.get();
   if (handle == nullptr) throw std::bad_alloc();
 
-  curl_easy_setopt(handle, CURLOPT_URL, url.c_str());
-  if (body != nullptr) curl_easy_setopt(handle, CURLOPT_POSTFIELDS, body->c_str());
-  curl_easy_setopt(handle, CURLOPT_WRITEFUNCTION, CurlFunction(writeFn));
-  curl_easy_setopt(handle, CURLOPT_WRITEDATA, &response);
+  curl.easy_setopt(handle, CURLOPT_URL, url.c_str());
+  if (body != nullptr) curl.easy_setopt(handle, CURLOPT_POSTFIELDS, body->c_str());
+  curl.easy_setopt(handle, CURLOPT_WRITEFUNCTION, CurlFunction(writeFn));
+  curl.easy_setopt(handle, CURLOPT_WRITEDATA, &response);
   if (!verifySSL) {
-    curl_easy_setopt(handle, CURLOPT_SSL_VERIFYHOST, 0L);
-    curl_easy_setopt(handle, CURLOPT_SSL_VERIFYPEER, 0L);
+    curl.easy_setopt(handle, CURLOPT_SSL_VERIFYHOST, 0L);
+    curl.easy_setopt(handle, CURLOPT_SSL_VERIFYPEER, 0L);
   }
 
-  const CURLcode result = curl_easy_perform(handle);
-  if (result != CURLE_OK) throw sso_err_resp(curl_easy_strerror(result));
+  const CURLcode result = curl.easy_perform(handle);
+  if (result != CURLE_OK) throw sso_err_resp(curl.easy_strerror(result));
 }
 
 // An open file.
