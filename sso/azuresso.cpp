@@ -38,7 +38,7 @@ const Json::Value& FindKey(const Json::Value& key_set, const std::string& kid) {
   if (keys != nullptr && keys->isArray()) {
     for (const Json::Value& key : *keys) {
       const Json::Value* const key_id = FindMember(key, "kid");
-      if (key_id != nullptr && key_id->asString() == kid) return key;
+      if (key_id != nullptr && HasText(*key_id, kid)) return key;
     }
   }
   throw std::invalid_argument("kid does not exist in Azure verified kyes");
@@ -62,11 +62,11 @@ std::string NameClaim(const Json::Value& claims) {
 // account@dns.domain as DNS.DOMAIN\account.
 std::string DomainUser(const std::string& principal) {
   Pieces<2> pieces;
-  if (!Split(principal, "@", pieces)) throw std::invalid_argument("cannot get the user name!");
-  std::string user(pieces[1].begin(), pieces[1].end());
+  if (!Split(principal, '@', pieces)) throw std::invalid_argument("cannot get the user name!");
+  std::string user(pieces[1]);
   const std::locale global;
   std::use_facet<std::ctype<char>>(global).toupper(&user[0], &user[0] + user.size());
-  return user.append(1, '\\').append(pieces[0].begin(), pieces[0].end());
+  return user.append(1, '\\').append(pieces[0]);
 }
 
 }  // namespace

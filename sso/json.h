@@ -34,6 +34,9 @@ const Json::Value* FindString(const Json::Value& value, const char* name);
 // Json::LogicError for an array or an object.
 std::string MemberText(const Json::Value& value, const char* name);
 
+// Whether the value is that text, or a number or the like that reads so. Throws as MemberText does.
+bool HasText(const Json::Value& value, const std::string& text);
+
 // Assigns the member `name` to `field` if it is there and of the right type.
 void TakeSetting(const Json::Value& settings, const char* name, bool& field);
 void TakeSetting(const Json::Value& settings, const char* name, std::string& field);

@@ -12,6 +12,7 @@
 
 #include <algorithm>
 #include <cstring>
+#include <string_view>
 #include <utility>
 
 #include "sso/json.h"
@@ -47,12 +48,10 @@ BioChain Base64Filter(BIO* memory) {
 // The text in the alphabet of standard base64, padded to whole groups of four. A text of 4k + 1
 // characters gets three pads; it stands for nothing and must not decode.
 std::string StandardBase64(const char* text, size_t length) {
-  std::string copy;
-  copy.reserve(length + 4);
-  copy.assign(text, length);
-  std::replace(copy.begin(), copy.end(), '-', '+');
-  std::replace(copy.begin(), copy.end(), '_', '/');
-  copy.append((4 - length % 4) % 4, '=');
+  std::string copy(length + (4 - length % 4) % 4, '=');
+  std::transform(text, text + length, copy.begin(), [](char c) {
+    return c == '-' ? '+' : c == '_' ? '/' : c;
+  });
   return copy;
 }
 
@@ -100,13 +99,12 @@ Json::Value ParseSegment(const std::string& segment, const char* failure) {
   return value;
 }
 
-// The text that was signed: the two segments as they stand in the token.
-std::string SigningInput(const std::string& header, const std::string& body) {
-  std::string input;
-  input.reserve(header.size() + 1 + body.size());
-  input.append(header).append(1, '.').append(body);
-  input.resize(strlen(input.c_str()));
-  return input;
+// The text that was signed, in pieces: the two segments as they stand in the token, and the dot
+// between them. It ends at the first zero byte.
+SSO::Pieces<3> SigningInput(const std::string& header, const std::string& body) {
+  const std::string_view front = header.c_str();
+  if (front.size() < header.size()) return {front, "", ""};
+  return {front, ".", body.c_str()};
 }
 
 // An RSA key that owns both numbers; null if it cannot be made.
@@ -136,7 +134,14 @@ PublicKey MakePublicKey(RSAKey rsa) {
   return key;
 }
 
-bool VerifyDigest(const std::string& input, const Bytes& signature, EVP_PKEY* key,
+// Digests the pieces one by one: joined first, a large token would be copied for nothing.
+bool UpdateDigest(EVP_MD_CTX* context, const SSO::Pieces<3>& input) {
+  return std::all_of(input.begin(), input.end(), [=](std::string_view piece) {
+    return EVP_DigestUpdate(context, piece.data(), piece.size()) == 1;
+  });
+}
+
+bool VerifyDigest(const SSO::Pieces<3>& input, const Bytes& signature, EVP_PKEY* key,
                   const EVP_MD* md) {
   const DigestContext context(EVP_MD_CTX_new());
   if (context == nullptr) return false;
@@ -144,7 +149,7 @@ bool VerifyDigest(const std::string& input, const Bytes& signature, EVP_PKEY* ke
     syslog(LOG_ERR, "%s:%d EVP_DigestVerifyInit failed", kUnit, __LINE__);
     return false;
   }
-  if (EVP_DigestUpdate(context.get(), input.data(), input.size()) != 1) {
+  if (!UpdateDigest(context.get(), input)) {
     syslog(LOG_ERR, "%s:%d EVP_DigestVerifyUpdate failed", kUnit, __LINE__);
     return false;
   }
@@ -156,7 +161,7 @@ bool VerifyDigest(const std::string& input, const Bytes& signature, EVP_PKEY* ke
   return true;
 }
 
-bool VerifyRSA(const std::string& input, const std::string& n, const std::string& e,
+bool VerifyRSA(const SSO::Pieces<3>& input, const std::string& n, const std::string& e,
                const std::string& signature, const EVP_MD* md) {
   const Bytes modulus(n);
   const Bytes exponent(e);
@@ -186,11 +191,15 @@ bool Base64UrlEncode(const unsigned char* bytes, unsigned count, std::string& te
   return true;
 }
 
-bool VerifyHMAC(const std::string& input, const std::string& key_text, const std::string& signature,
-                const EVP_MD* md) {
+bool VerifyHMAC(const SSO::Pieces<3>& pieces, const std::string& key_text,
+                const std::string& signature, const EVP_MD* md) {
   const Bytes key(key_text);
   // A text that decodes to nothing must not pass as the empty key.
   if (key.missing() || key.size() == 0) return false;
+
+  std::string input;
+  input.reserve(pieces[0].size() + pieces[1].size() + pieces[2].size());
+  for (const std::string_view piece : pieces) input += piece;
 
   unsigned char mac[EVP_MAX_MD_SIZE];
   unsigned count = 0;
@@ -215,10 +224,14 @@ jwt_verify_failed::~jwt_verify_failed() = default;
 
 Jwt::Jwt(std::string token) {
   SSO::Pieces<3> segments;
-  if (!SSO::Split(token, ".", segments)) throw std::invalid_argument("bad jwt format!");
-  header.assign(segments[0].begin(), segments[0].end());
-  body.assign(segments[1].begin(), segments[1].end());
-  signature.assign(segments[2].begin(), segments[2].end());
+  if (!SSO::Split(token, '.', segments)) throw std::invalid_argument("bad jwt format!");
+  header = segments[0];
+  signature = segments[2];
+  // The body, by far the largest, stays in the token's own memory.
+  const size_t size = segments[1].size();
+  token.erase(0, header.size() + 1);
+  token.resize(size);
+  body = std::move(token);
 }
 
 Json::Value Jwt::GetHeader() {

@@ -10,6 +10,7 @@
 #include <syslog.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <new>
 
@@ -188,6 +189,13 @@ const Json::Value* FindString(const Json::Value& value, const char* name) {
 std::string MemberText(const Json::Value& value, const char* name) {
   const Json::Value* const member = FindMember(value, name);
   return member != nullptr ? member->asString() : std::string();
+}
+
+bool HasText(const Json::Value& value, const std::string& text) {
+  const char* begin = nullptr;
+  const char* end = nullptr;
+  if (!value.getString(&begin, &end)) return value.asString() == text;  // not a string
+  return std::equal(begin, end, text.begin(), text.end());
 }
 
 void TakeSetting(const Json::Value& settings, const char* name, bool& field) {
