@@ -125,6 +125,14 @@ class Stage:
             "-out", base + ".pem")
         return base + ".pem", base + ".key"
 
+    def unknown_certificate(self, name):
+        """A certificate for a name that nobody vouches for; returns the paths as certificate()."""
+        base = f"{FOLDER}/{name}-unknown"
+        run("openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256",
+            "-nodes", "-days", "30", "-subj", "/CN=" + name, "-addext",
+            "subjectAltName=DNS:" + name, "-keyout", base + ".key", "-out", base + ".pem")
+        return base + ".pem", base + ".key"
+
     # -- processes -------------------------------------------------------------------------
 
     def spawn(self, name, command, user=None, environment=None):

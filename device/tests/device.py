@@ -34,6 +34,7 @@ class Device:
             "tid": "tenant-7", "unique_name": "alice@plant7.example.net"})
         self.provider = Scripted(self.stage, self.person)
         self.provider.start()
+        self.home = self.provider
         self.clients = {}
         self.server = None
         self.use(Lighttpd)
@@ -54,6 +55,20 @@ class Device:
                 address + "/webman/ssoclient/relay.html")
             add = {"azure": self.provider.add_azure, "websphere": self.provider.add_websphere}
             self.stage.configure(name, settings_of(name, client, add[name](client), self.person))
+
+    def visit(self, provider):
+        """Another provider takes the scripted one's place."""
+        self.home = self.provider
+        self.home.stop()
+        self.provider = provider(self.stage, self.person)
+        self.provider.start()
+        self._register()
+
+    def come_home(self):
+        self.provider.stop()
+        self.provider = self.home
+        self.provider.start()
+        self._register()
 
     def choose(self, profile):
         self.stage.configure("profile", {"sso_enable": True, "sso_profile": profile}, 0o644)
@@ -89,11 +104,11 @@ class DeviceTest(unittest.TestCase):
 
     def setUp(self):
         self.device = device()
-        self.device.provider.script = Script()
-        self.device.provider.seen.clear()
+        self.device.home.script = Script()
+        self.device.home.seen.clear()
         self.device.choose("websphere")
         self.browser = self.new_browser()
-        self.addCleanup(self.device.provider.release)
+        self.addCleanup(self.device.home.release)
         self.log_start = len(self.device.stage.log.lines)
 
     def new_browser(self):

@@ -1,6 +1,7 @@
-"""Runs the tests of the device; inside scripts/sandbox, called by scripts/check-device.
+"""Runs the tests of a folder; inside scripts/sandbox, called by scripts/check-device (this folder)
+and scripts/check-browser (browser/).
 
-  run.py BUILD-FOLDER [PATTERN]
+  run.py FOLDER BUILD-FOLDER [PATTERN]
 """
 
 import os
@@ -27,12 +28,12 @@ class Result(unittest.TextTestResult):
 
 
 def main():
-    os.environ["SSOCLIENT_BUILD"] = os.path.abspath(sys.argv[1])
+    os.environ["SSOCLIENT_BUILD"] = os.path.abspath(sys.argv[2])
     sys.path.insert(0, HERE)
     loader = unittest.TestLoader()
-    if len(sys.argv) > 2:
-        loader.testNamePatterns = [f"*{sys.argv[2]}*"]
-    suite = loader.discover(HERE)
+    if len(sys.argv) > 3:
+        loader.testNamePatterns = [f"*{sys.argv[3]}*"]
+    suite = loader.discover(os.path.abspath(sys.argv[1]))
     result = unittest.TextTestRunner(sys.stdout, verbosity=0, resultclass=Result).run(suite)
     failed = len({str(test).split(" (")[0] + str(test).split("(")[1]
                   for test, _ in result.failures + result.errors})

@@ -345,7 +345,7 @@ class Deadline(DeviceTest):
         device().use(Lighttpd)
 
     def test_silent_provider(self):
-        self.device.provider.script = Script(silent=True)
+        self.device.provider.script = Script(silent=("token",))
         url = self.callback_url()
         begun = time.monotonic()
         page = self.browser.get(url)
@@ -357,7 +357,7 @@ class Deadline(DeviceTest):
     def test_identities_and_orphan(self):
         """While it waits: effective ids of the web server, root saved. And when the web server
         ends the login program, its child does not wait for ever."""
-        self.device.provider.script = Script(silent=True)
+        self.device.provider.script = Script(silent=("token",))
         url = self.callback_url()
         waiting = threading.Thread(target=self.browser.get, args=(url,))
         waiting.start()
@@ -377,7 +377,7 @@ class Deadline(DeviceTest):
     def test_plain_road(self):
         self.addCleanup(self.setUpClass)
         self.device.use(Lighttpd, SSO_LOGIN_DEADLINE="1", SSO_LOGIN_ROAD="plain")
-        self.device.provider.script = Script(silent=True)
+        self.device.provider.script = Script(silent=("token",))
         self.assert_refused(self.sign_in(), "provider did not answer in time")
 
 
@@ -494,8 +494,13 @@ class Logout(DeviceTest):
 
     def test_websphere(self):
         self.sign_in()
-        self.assertEqual(self.logout().location, self.device.provider.url + "/websphere/logout")
+        page = self.logout()
+        relay = self.device.stage.device + "/webman/ssoclient/relay.html"
+        self.assertEqual(page.location, self.device.provider.url +
+                         "/websphere/logout?post_logout_redirect_uri=" +
+                         urllib.parse.quote(relay, safe=""))
         self.assertIsNone(self.user())
+        self.assertEqual(self.browser.get(page.location).location, relay)
 
     def test_host_header_is_not_believed(self):
         self.device.choose("azure")

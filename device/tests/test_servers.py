@@ -51,7 +51,7 @@ class OnServer:
     def test_deadline_from_the_environment(self):
         self.addCleanup(self.device.use, self.server)
         self.device.use(self.server, SSO_LOGIN_DEADLINE="1")
-        self.device.provider.script = Script(silent=True)
+        self.device.provider.script = Script(silent=("token",))
         self.assert_refused(self.sign_in(), "provider did not answer in time")
 
     def test_plain_road_from_the_environment(self):

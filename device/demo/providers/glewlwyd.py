@@ -64,6 +64,8 @@ REALM = {
 
 class Glewlwyd:
     title = "Glewlwyd"
+    fields = "#username", "#password"  # of the login page
+    comes_back = False  # after a logout: it ends on an empty page of its own
 
     def __init__(self, stage, person):
         self.url = f"https://{stage.provider_name}:{stage.provider_port}"
@@ -80,6 +82,9 @@ class Glewlwyd:
         self._stage.wait_for("glewlwyd", self._stage.provider_port)
         self._take_over()
         self._add_person()
+
+    def stop(self):
+        self._stage.stop("glewlwyd")
 
     def _files(self):
         folder, owner = self._folder, pwd.getpwnam(USER).pw_uid
@@ -195,3 +200,15 @@ class Glewlwyd:
         if not all(scope["granted"] for scope in scopes):
             browser.call("PUT", grant, {"scope": values["scope"]})
         return browser.get(values["callback_url"] + "&g_continue")
+
+    @staticmethod
+    def agree(tab):
+        """Ticks what the client asks for, where that is not granted yet, and goes on."""
+        tab.find("button.btn-success")
+        boxes = [box for box in tab.all(".form-check-input") if box.is_enabled()]
+        for box in boxes:
+            box.click()
+        if boxes:
+            tab.click("button.btn-primary")
+            tab.wait(lambda: not tab.all(".form-check-input"), "the grant")
+        tab.click("button.btn-success")

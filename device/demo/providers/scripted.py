@@ -15,6 +15,7 @@ import json
 import secrets
 import ssl
 import subprocess
+import sys
 import threading
 import time
 import urllib.parse
@@ -24,9 +25,10 @@ from stage import run, write
 
 LOGIN_PAGE = """<!DOCTYPE html>
 <html lang="en"><head><meta charset="utf-8"><title>Provider</title></head><body><main>
-<h1>Sign in</h1><form id="login" method="post" action="{action}">
-<label>Name <input name="username" autocomplete="username"></label>
-<label>Password <input name="password" type="password"></label>
+<h1>Sign in</h1><p>{hint}</p><form id="login" method="post" action="{action}">
+<label>Name <input id="username" name="username" autocomplete="username" autofocus></label>
+<label>Password <input id="password" name="password" type="password"
+autocomplete="current-password"></label>
 <button>Sign in</button></form></main></body></html>"""
 
 
@@ -42,8 +44,12 @@ class Script:
     claims: object = None      # changes the claims of the ID token
     header: object = None      # changes the header of the ID token
     signature: object = None   # changes the bytes of the signature
+    sign: object = None        # signs instead of the provider's key: bytes to signature
     token_answer: object = None  # changes (status, type, body) of the token endpoint
-    silent: bool = False       # the token endpoint takes the request and does not answer
+    document: object = None    # changes (path, status, type, body) of "wellknown" and "keys"
+    silent: tuple = ()         # paths ("token", "keys"...) that take the request and do not answer
+    cut: tuple = ()            # paths whose answer ends in its middle
+    leave: bool = False        # nobody listens any more once a code is handed out
 
 
 @dataclasses.dataclass
@@ -57,36 +63,46 @@ class Realm:
 
 class Scripted:
     title = "scripted provider"
+    fields = "#username", "#password"  # of the login page
+    comes_back = True  # after a logout
 
     def __init__(self, stage, person):
         self.url = f"https://{stage.provider_name}:{stage.provider_port}"
         self.script = Script()
         self.seen = []
+        self.sent = []  # where the browsers were sent back to
         self._stage = stage
         self._person = person
         self._realms = {}
         self._codes = {}
-        self._server = None
+        self._servers = []
+        self._keys = 0
         self._released = threading.Event()
 
     # -- set-up ----------------------------------------------------------------------------
 
     def start(self):
+        self.listen(self._stage.provider_port,
+                    self._stage.certificate(self._stage.provider_name))
+
+    def listen(self, port, certificate):
+        """Opens one more door to the same provider, with a certificate of its own."""
         context = ssl.create_default_context(ssl.Purpose.CLIENT_AUTH)
-        context.load_cert_chain(*self._stage.certificate(self._stage.provider_name))
+        context.load_cert_chain(*certificate)
         handler = type("Handler", (_Handler,), {"provider": self})
-        self._server = http.server.ThreadingHTTPServer(
-            ("127.0.0.1", self._stage.provider_port), handler)
-        self._server.daemon_threads = True
+        server = _Server(("127.0.0.1", port), handler)
         # The handshake belongs to the connection's own thread.
-        self._server.socket = context.wrap_socket(self._server.socket, server_side=True,
-                                                  do_handshake_on_connect=False)
-        threading.Thread(target=self._server.serve_forever, daemon=True).start()
+        server.socket = context.wrap_socket(server.socket, server_side=True,
+                                            do_handshake_on_connect=False)
+        threading.Thread(target=server.serve_forever, args=(0.05,), daemon=True).start()
+        self._servers.append(server)
 
     def stop(self):
         self.release()
-        self._server.shutdown()
-        self._server.server_close()
+        while self._servers:
+            server = self._servers.pop()
+            server.shutdown()
+            server.server_close()
 
     def release(self):
         """Lets the requests go that a silent token endpoint holds; they get no answer."""
@@ -97,18 +113,34 @@ class Scripted:
         self._released.wait(60)
 
     def add_azure(self, client):
-        key = self._stage.folder + "/scripted.key"
-        write(key, run("openssl", "genpkey", "-algorithm", "RSA"), 0o600)
-        modulus = run("openssl", "rsa", "-in", key, "-noout", "-modulus").split("=")[1].strip()
+        key, public = self._key("key-1")
+        return self._add("azure", Realm(client, key, {"alg": "RS256", "kid": "key-1"},
+                                        dict(self._person.claims), [public]))
+
+    def _key(self, identity):
+        """A new RSA key: what signs with it, and its public half for the key set."""
+        self._keys += 1
+        path = f"{self._stage.folder}/scripted-{self._keys}.key"
+        write(path, run("openssl", "genpkey", "-algorithm", "RSA"), 0o600)
+        modulus = run("openssl", "rsa", "-in", path, "-noout", "-modulus").split("=")[1].strip()
 
         def sign(data):
-            return subprocess.run(["openssl", "dgst", "-sha256", "-sign", key], input=data,
+            return subprocess.run(["openssl", "dgst", "-sha256", "-sign", path], input=data,
                                   stdout=subprocess.PIPE, check=True, timeout=30).stdout
 
-        return self._add("azure", Realm(
-            client, sign, {"alg": "RS256", "kid": "key-1"}, dict(self._person.claims),
-            [{"kty": "RSA", "kid": "key-1", "n": _base64url(bytes.fromhex(modulus)),
-              "e": "AQAB"}]))
+        return sign, {"kty": "RSA", "kid": identity, "n": _base64url(bytes.fromhex(modulus)),
+                      "e": "AQAB"}
+
+    def signer(self, name):
+        """What signs now; for a script to use later."""
+        return self._realms[name].sign
+
+    def rotate(self, identity):
+        """Signs with a new key from now on, and publishes that one alone."""
+        realm = self._realms["azure"]
+        realm.sign, public = self._key(identity)
+        realm.header = {**realm.header, "kid": identity}
+        realm.keys = [public]
 
     def add_websphere(self, client):
         def sign(data):
@@ -129,6 +161,9 @@ class Scripted:
         return browser.post(urllib.parse.urljoin(page.url, form["action"]), {
             "username": self._person.account, "password": self._person.password})
 
+    def agree(self, tab):
+        """Asks nothing after name and password."""
+
     # -- the endpoints ---------------------------------------------------------------------
 
     def authorization(self, name, query, form):
@@ -138,20 +173,23 @@ class Scripted:
             return 400, {}, "unknown client"
         if self.script.refuse is not None:
             return self._back(query, self.script.refuse)
+        action = html.escape(f"/{name}/authorization?{urllib.parse.urlencode(query)}")
         if form is None:
-            action = f"/{name}/authorization?{urllib.parse.urlencode(query)}"
-            return 200, {}, LOGIN_PAGE.format(action=html.escape(action))
-        if form.get("password") != self._person.password:
-            return 403, {}, "wrong name or password"
+            return 200, {}, LOGIN_PAGE.format(action=action, hint="")
+        if (form.get("username"), form.get("password")) != \
+                (self._person.account, self._person.password):
+            return 403, {}, LOGIN_PAGE.format(action=action, hint="Wrong name or password.")
         code = secrets.token_urlsafe(16)
         self._codes[code] = (name, query.get("nonce"))
+        if self.script.leave:
+            self.stop()
         return self._back(query, {"code": code})
 
-    @staticmethod
-    def _back(query, values):
+    def _back(self, query, values):
         values = {**values, "state": query.get("state", "")}
-        return 302, {"Location": query["redirect_uri"] + "?" +
-                     urllib.parse.urlencode(values, quote_via=urllib.parse.quote)}, ""
+        self.sent.append(query["redirect_uri"] + "?" +
+                         urllib.parse.urlencode(values, quote_via=urllib.parse.quote))
+        return 302, {"Location": self.sent[-1]}, ""
 
     def token(self, name, form):
         """The answer of the token endpoint: status, type, body."""
@@ -179,15 +217,20 @@ class Scripted:
         if self.script.header is not None:
             header = self.script.header(header)
         signed = ".".join(_base64url(json.dumps(part).encode()) for part in (header, claims))
-        signature = realm.sign(signed.encode())
+        signature = (self.script.sign or realm.sign)(signed.encode())
         if self.script.signature is not None:
             signature = self.script.signature(signature)
         return signed + "." + _base64url(signature)
 
-    def documents(self, name, path):
+    def document(self, name, path):
+        """The discovery document or the key set: status, type, body."""
         if path == "wellknown":
-            return {"issuer": f"{self.url}/{name}", "jwks_uri": f"{self.url}/{name}/keys"}
-        return {"keys": self._realms[name].keys}
+            value = {"issuer": f"{self.url}/{name}", "jwks_uri": f"{self.url}/{name}/keys"}
+        else:
+            value = {"keys": self._realms[name].keys}
+        answer = 200, "application/json", json.dumps(value)
+        change = self.script.document
+        return answer if change is None else change(path, *answer)
 
     def known(self, name):
         return name in self._realms
@@ -199,9 +242,19 @@ class Scripted:
         return next(reversed(self._codes))
 
 
+class _Server(http.server.ThreadingHTTPServer):
+    daemon_threads = True
+
+    def handle_error(self, request, client_address):
+        """Who does not like the certificate hangs up: no mistake of the provider."""
+        if not isinstance(sys.exc_info()[1], OSError):
+            super().handle_error(request, client_address)
+
+
 class _Handler(http.server.BaseHTTPRequestHandler):
     provider = None
     timeout = 30
+    _cut = False
 
     def log_message(self, *_):
         pass
@@ -219,26 +272,24 @@ class _Handler(http.server.BaseHTTPRequestHandler):
         query = dict(urllib.parse.parse_qsl(parts.query, keep_blank_values=True))
         name, _, path = parts.path.lstrip("/").partition("/")
         self.provider.seen.append((self.command, parts.path, query, form))
-        if not self.provider.known(name):
+        self._cut = path in self.provider.script.cut
+        if path in self.provider.script.silent:
+            self.provider.hold()
+            self.close_connection = True
+        elif not self.provider.known(name):
             self._send(404, {}, "")
         elif path == "authorization":
             self._send(*self.provider.authorization(name, query, form))
         elif path == "token" and form is not None:
-            self._token(name, form)
+            self._send_document(*self.provider.token(name, form))
         elif path in ("wellknown", "keys"):
-            self._send(200, {"Content-Type": "application/json"},
-                       json.dumps(self.provider.documents(name, path)))
+            self._send_document(*self.provider.document(name, path))
         elif path == "logout" and "post_logout_redirect_uri" in query:
             self._send(302, {"Location": query["post_logout_redirect_uri"]}, "")
         else:
             self._send(200, {}, "signed out")
 
-    def _token(self, name, form):
-        if self.provider.script.silent:
-            self.provider.hold()
-            self.close_connection = True
-            return
-        status, kind, body = self.provider.token(name, form)
+    def _send_document(self, status, kind, body):
         self._send(status, {"Content-Type": kind}, body)
 
     def _send(self, status, headers, body):
@@ -249,6 +300,6 @@ class _Handler(http.server.BaseHTTPRequestHandler):
             for field, value in {**headers, "Content-Length": str(len(data))}.items():
                 self.send_header(field, value)
             self.end_headers()
-            self.wfile.write(data)
+            self.wfile.write(data[:len(data) // 2] if self._cut else data)
         except OSError:  # whoever asked is gone
             self.close_connection = True

@@ -1,0 +1,177 @@
+"""Chromium without a window, in front of which a person sits.
+
+One browser serves one person after the other; nobody finds anything of who was there before.
+What is read from a page is what a person sees, and what is entered goes through keys and clicks.
+"""
+
+import base64
+import os
+import time
+
+from selenium import webdriver
+from selenium.common.exceptions import WebDriverException
+from selenium.webdriver.chrome.service import Service
+from selenium.webdriver.common.by import By
+from selenium.webdriver.common.keys import Keys
+from selenium.webdriver.remote.remote_connection import RemoteConnection
+
+from stage import StageError, run
+
+PATIENCE = 30  # seconds until a page that does not come is given up
+
+# The first line: root needs it, and the namespace is the sandbox here. The second: a small machine
+# without a screen. The rest: no word to anybody but the pages.
+FLAGS = ("--no-sandbox",
+         "--headless", "--disable-gpu", "--disable-dev-shm-usage", "--hide-scrollbars",
+         "--disable-quic", "--no-first-run", "--disable-background-networking",
+         "--disable-component-update", "--disable-sync", "--disable-default-apps",
+         "--disable-extensions", "--no-proxy-server", "--lang=en-US")
+
+# The relay page goes on by itself: what it showed is kept for who comes to look a moment later.
+KEEP = """
+if (location.pathname.endsWith("/relay.html")) {
+  addEventListener("DOMContentLoaded", () => {
+    const kept = JSON.parse(sessionStorage.getItem("relay") || "[]");
+    kept.push({url: location.href, text: document.body.innerText});
+    sessionStorage.setItem("relay", JSON.stringify(kept));
+  });
+}
+"""
+
+
+class TabError(Exception):
+    """A page is not what the person in front of it expects."""
+
+
+class Chromium:
+    def __init__(self, stage):
+        self._folder = stage.folder + "/chromium"
+        self._driver = None
+        self._trust(stage.authority)
+        RemoteConnection.set_timeout(2 * PATIENCE)
+        options = webdriver.ChromeOptions()
+        options.binary_location = "/usr/bin/chromium"
+        options.set_capability("goog:loggingPrefs", {"browser": "ALL"})
+        for flag in (*FLAGS, f"--user-data-dir={self._folder}/profile"):
+            options.add_argument(flag)
+        service = Service("/usr/bin/chromedriver", log_path=stage.logs + "/chromedriver.log",
+                          env={**os.environ, "HOME": self._folder})
+        try:
+            self._driver = webdriver.Chrome(service=service, options=options)
+        except WebDriverException as error:
+            raise StageError(f"Chromium does not start: {error.msg}") from error
+        self._driver.set_page_load_timeout(PATIENCE)
+        self._driver.set_script_timeout(PATIENCE)
+
+    def _trust(self, authority):
+        """Makes the stage's authority known where Chromium looks: in its user's database. A flag
+        that ignores errors would not notice a certificate that a person is warned of."""
+        database = self._folder + "/.pki/nssdb"
+        os.makedirs(database)
+        run("certutil", "-N", "-d", "sql:" + database, "--empty-password")
+        run("certutil", "-A", "-d", "sql:" + database, "-n", "stage", "-t", "C,,", "-i", authority)
+
+    def person(self):
+        """A tab for a person who was never here; the one before is gone."""
+        driver = self._driver
+        old = driver.window_handles
+        driver.switch_to.new_window("tab")
+        new = driver.current_window_handle
+        for handle in old:
+            driver.switch_to.window(handle)
+            driver.close()
+        driver.switch_to.window(new)
+        driver.execute_cdp_cmd("Network.clearBrowserCookies", {})
+        driver.execute_cdp_cmd("Network.clearBrowserCache", {})
+        return Tab(driver)
+
+    def close(self):
+        self._driver.quit()
+
+
+class Tab:
+    def __init__(self, driver):
+        self.driver = driver
+        self.command("Page.addScriptToEvaluateOnNewDocument", source=KEEP)
+        self.complaints()
+
+    def command(self, name, **parameters):
+        """A command of the developer tools."""
+        return self.driver.execute_cdp_cmd(name, parameters)
+
+    # -- what a person does ----------------------------------------------------------------
+
+    def open(self, url):
+        """Goes to an address. Where the browser shows a page of its own instead, that is it."""
+        try:
+            self.driver.get(url)
+        except WebDriverException as error:
+            if "net::ERR_" not in (error.msg or ""):
+                raise TabError(f"{url} does not open: {error.msg}") from error
+
+    def type(self, field, text):
+        element = self.find(field)
+        element.clear()
+        element.send_keys(text)
+
+    def click(self, what):
+        self.find(what).click()
+
+    def press(self, *keys):
+        """Presses keys, by their names in selenium's list, or characters."""
+        for key in keys:
+            self.driver.switch_to.active_element.send_keys(getattr(Keys, key, key))
+
+    # -- what a person sees ----------------------------------------------------------------
+
+    @property
+    def url(self):
+        return self.driver.current_url
+
+    @property
+    def title(self):
+        return self.driver.title
+
+    @property
+    def text(self):
+        return self.script("return document.body ? document.body.innerText : ''")
+
+    def script(self, text, *arguments):
+        return self.driver.execute_script(text, *arguments)
+
+    def find(self, what):
+        """The first element of a CSS selector that a person can see, as soon as it is there."""
+        return self.wait(lambda: next(iter(self.all(what)), None), f"'{what}'")
+
+    def all(self, what):
+        """All elements of a CSS selector that a person can see now."""
+        found = self.driver.find_elements(By.CSS_SELECTOR, what)
+        return [element for element in found if element.is_displayed()]
+
+    def wait(self, condition, what, seconds=PATIENCE):
+        """Waits until a condition holds, and returns what it gave."""
+        end = time.monotonic() + seconds
+        while True:
+            try:
+                if value := condition():
+                    return value
+            except WebDriverException:  # the page changed under our eyes
+                pass
+            if time.monotonic() > end:
+                raise TabError(f"waited in vain for {what}; the page is {self.url}: "
+                               f"{' '.join(self.text.split())[:200]}")
+            time.sleep(0.05)
+
+    def relay(self):
+        """What relay pages showed to this person, oldest first: their URLs and texts."""
+        return self.script("return JSON.parse(sessionStorage.getItem('relay') || '[]')")
+
+    def complaints(self):
+        """What the browser has logged since the last time: scripts that fail, violations of a
+        policy, missing files."""
+        return [entry["message"] for entry in self.driver.get_log("browser")]
+
+    def screenshot(self, path):
+        picture = self.command("Page.captureScreenshot", format="png")["data"]
+        with open(path, "wb") as file:
+            file.write(base64.b64decode(picture))

@@ -1,0 +1,190 @@
+"""What an attacker may put before a person's browser, and what comes of it."""
+
+import base64
+import json
+import unittest
+import urllib.parse
+
+from device import values_of
+from providers.scripted import Script
+from scenario import Scenario
+
+USED_UP = "login was not started in this browser, or is used up"
+OTHER_STATE = "state does not belong to this login"
+MARKUP = "<img src=x onerror=\"document.title='owned'\"><script>document.title='owned'</script>"
+FOREIGN = ("https://evil.localhost/", "//evil.localhost/", "/\\evil.localhost",
+           "javascript:document.title='owned'", "data:text/html,owned", "\t//evil.localhost/")
+
+
+class Callbacks(Scenario):
+    """The attacker has a browser of his own (self.browser), and sends links."""
+
+    def forged(self, profile):
+        self.device.choose(profile)
+        link = self.callback_url()
+        self.device.provider.seen.clear()
+        return link
+
+    def assert_code_kept(self):
+        self.assertFalse([path for _, path, _, _ in self.device.provider.seen
+                          if path.endswith("/token")], "the code was used")
+
+    def test_forged_callback_without_a_login(self):
+        self.tab.open(self.forged("azure"))
+        self.assert_refused_here(USED_UP)
+        self.assert_code_kept()
+
+    def test_forged_callback_into_a_login_azure(self):
+        self.forged_into_a_login("azure")
+
+    def test_forged_callback_into_a_login_websphere(self):
+        self.forged_into_a_login("websphere")
+
+    def forged_into_a_login(self, profile):
+        link = self.forged(profile)
+        self.to_provider(profile)
+        self.tab.find("#password")
+        self.tab.open(link)
+        self.assert_refused_here(OTHER_STATE)
+        self.assert_code_kept()
+
+    def test_stolen_code_azure(self):
+        self.stolen_code("azure")
+
+    def test_stolen_code_websphere(self):
+        self.stolen_code("websphere")
+
+    def stolen_code(self, profile):
+        """Somebody else's code, brought into a login of one's own."""
+        code = values_of(self.forged(profile))["code"]
+        self.to_provider(profile)
+        self.tab.find("#password")
+        state = values_of(self.tab.url)["state"]
+        self.tab.open(self.device.login_url + "?" +
+                      urllib.parse.urlencode({"code": code, "state": state}))
+        self.assert_refused_here("nonce does not belong to this login")
+
+    def test_replayed_in_the_same_browser(self):
+        self.sign_in("azure")
+        self.assert_in("azure")
+        self.sign_out()
+        self.assert_out()
+        self.tab.open(self.device.provider.sent[-1])
+        self.assertEqual(self.tab.title, "Not signed in")
+        self.assertEqual(self.tab.find("#reason").text, USED_UP)
+        self.assert_logged("sign-in failed: " + USED_UP)
+        self.assert_nobody()
+
+    def test_replayed_in_another_browser(self):
+        """The other one gets nothing, and the person stays signed in."""
+        self.sign_in("websphere")
+        self.assert_in("websphere")
+        page = self.browser.get(self.device.provider.sent[-1])
+        self.assert_refused(page, USED_UP)
+        self.assertEqual(self.user_shown(), "alice")
+
+    def test_altered_state(self):
+        self.to_provider("websphere")
+        self.tab.find("#password")
+        state = json.loads(base64.b64decode(values_of(self.tab.url)["state"]))
+        state["origin"] = "/elsewhere"
+        link = {"code": "x", "state": base64.b64encode(json.dumps(state).encode()).decode()}
+        self.tab.open(self.device.login_url + "?" + urllib.parse.urlencode(link))
+        self.assert_refused_here(OTHER_STATE)
+
+    def test_a_link_does_not_sign_out(self):
+        self.sign_in("websphere")
+        self.assert_in("websphere")
+        self.tab.open(self.device.login_url + "?action=logout")
+        self.tab.wait(lambda: self.tab.title == "Not signed in", "the relay page")
+        self.assertEqual(self.user_shown(), "alice")
+
+
+class Links(Scenario):
+    """Links to the device's own pages with somebody else's words in them."""
+
+    def test_foreign_origin(self):
+        for origin in FOREIGN:
+            with self.subTest(origin=origin):
+                self.device.choose("websphere")
+                self.tab.open(self.device.login_url + "?" +
+                              urllib.parse.urlencode({"action": "start", "origin": origin}))
+                self.enter()
+                self.on("/")
+                self.assertEqual(self.tab.find("#user").text, "alice")
+                self.sign_out()
+                self.assert_out()
+
+    def test_foreign_origin_in_the_fragment(self):
+        for origin in FOREIGN:
+            with self.subTest(origin=origin):
+                self.tab.open("about:blank")
+                self.tab.open(self.relay_url + "#success=true&origin=" +
+                              urllib.parse.quote(origin, safe=""))
+                self.on("/")
+                self.assertEqual(self.tab.title, "Device")
+
+    def test_markup_in_the_providers_reason(self):
+        short = MARKUP[:90]
+        self.device.provider.script = Script(refuse={"error": short})
+        self.to_provider("azure")
+        self.assert_text_only("provider refused: " + short)
+        self.assert_refused_here("provider refused: " + short)
+
+    def test_markup_in_the_fragment(self):
+        self.tab.open(self.relay_url + "#success=false&reason=" + urllib.parse.quote(MARKUP))
+        self.assert_text_only(MARKUP)
+
+    def assert_text_only(self, text):
+        self.tab.wait(lambda: self.tab.title == "Not signed in", "the relay page")
+        self.assertEqual(self.tab.find("#reason").text, text)
+        self.assertEqual(self.tab.script(
+            "return document.querySelectorAll('main *').length"), 5)
+        self.assertEqual(self.tab.script("return document.scripts.length"), 1)
+        self.assertEqual(self.tab.title, "Not signed in")
+
+    def test_markup_in_the_users_name(self):
+        self.device.provider.script = Script(claims=lambda claims: {**claims, "sub": MARKUP})
+        self.sign_in("websphere")
+        self.on("/index.cgi")
+        self.assertEqual(self.tab.find("#user").text, MARKUP)
+        self.assertEqual(self.tab.title, "Device")
+
+    def test_unknown_outcome(self):
+        """Whatever stands in the fragment, nobody is signed in by it."""
+        for fragment in ("", "#", "#success=maybe", "#success=TRUE", "#%", "#origin=/index.cgi"):
+            with self.subTest(fragment=fragment):
+                self.tab.open("about:blank")
+                self.tab.open(self.relay_url + fragment)
+                self.assertEqual(self.tab.find("#outcome").text, "Signed out")
+        self.assert_nobody()
+
+    def test_policy_of_the_relay_page(self):
+        """The page would not run a script that got into it, and this test would see one tried."""
+        self.tab.open(self.relay_url + "#success=false")
+        self.tab.script("""
+            const inline = document.createElement("script");
+            inline.textContent = "document.title = 'owned'";
+            document.body.append(inline);
+            const image = document.createElement("img");
+            image.src = arguments[0];
+            document.body.append(image);""", self.device.provider.url + "/image.png")
+        refused = self.tab.wait(lambda: [text for text in self.tab.complaints()
+                                         if "Content Security Policy" in text], "a violation")
+        self.assertTrue(refused[0].startswith(self.device.stage.device), refused)
+        self.assertEqual(self.tab.title, "Not signed in")
+        self.assertNotIn("/image.png", [path for _, path, _, _ in self.device.provider.seen])
+
+    def test_no_frame(self):
+        """Nobody lays a page of the device under a page of his own."""
+        self.tab.open(self.device.provider.url + "/websphere/logout")
+        self.tab.script("""
+            const frame = document.createElement("iframe");
+            frame.src = arguments[0];
+            document.body.append(frame);""", self.device.front_url)
+        self.tab.wait(lambda: [text for text in self.tab.complaints() if "frame" in text.lower()],
+                      "the browser's refusal")
+
+
+if __name__ == "__main__":
+    unittest.main()
