@@ -93,6 +93,8 @@ class Tab:
     def __init__(self, driver):
         self.driver = driver
         self.command("Page.addScriptToEvaluateOnNewDocument", source=KEEP)
+        # As if the window was in front: without one, nothing would have the focus.
+        self.command("Emulation.setFocusEmulationEnabled", enabled=True)
         self.complaints()
 
     def command(self, name, **parameters):

@@ -50,7 +50,8 @@ std::string Member(const Json::Value& object, const std::string& name) {
 
 bool IsOwnPath(const std::string& text) {
   if (text.empty() || text[0] != '/' || text.size() > kLongestOrigin) return false;
-  if (text.size() > 1 && text[1] == '/') return false;
+  // Not even further on: "/..//host" is "//host" once its dots are resolved.
+  if (text.substr(0, text.find('?')).find("//") != std::string::npos) return false;
   return text.find_first_not_of(
              "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789"
              "/._~-?&=%") == std::string::npos;

@@ -17,7 +17,8 @@ from providers.scripted import Script
 from servers import Lighttpd
 
 FOREIGN = ("https://evil.example/", "//evil.example/", "/\\evil.example", "javascript:alert(1)",
-           "evil", "", "/" + "a" * 300, "/é", "/\"", "/<b>")
+           "evil", "", "/" + "a" * 300, "/é", "/\"", "/<b>",
+           "/..//evil.example/", "/.//evil.example/", "/%2e%2e//evil.example/")
 DEADLINE = 4  # seconds; the child's own clock is set to twice as much
 
 
@@ -70,7 +71,7 @@ class Start(DeviceTest):
         self.assertNotIn("origin", state_of(location[1]))
 
     def test_own_origin_is_kept(self):
-        for origin in ("/", "/index.cgi", "/a/b.html?x=1&y=%20", "/~user/-_."):
+        for origin in ("/", "/index.cgi", "/a/b.html?x=1&y=%20", "/a?b=//c", "/~user/-_."):
             with self.subTest(origin=origin):
                 self.assertEqual(state_of(self.start(origin=origin).location)["origin"], origin)
 

@@ -5,7 +5,8 @@
 function ownPage(origin) {
   if (!origin || !origin.startsWith("/")) return "/";
   const url = new URL(origin, location.href);
-  return url.origin === location.origin ? url.pathname + url.search : "/";
+  // A path may begin with "//" once its dots are resolved: alone, that would be another host's.
+  return url.origin === location.origin && !url.pathname.startsWith("//") ? url.href : "/";
 }
 
 function show(outcome, reason, onward, label) {

@@ -212,3 +212,6 @@ class Glewlwyd:
             tab.click("button.btn-primary")
             tab.wait(lambda: not tab.all(".form-check-input"), "the grant")
         tab.click("button.btn-success")
+
+    def agree_to_leave(self, tab):
+        """Asks nothing at the logout."""

@@ -6,6 +6,7 @@ one thing at a time, see Script. Everything that it was asked is kept in `seen`.
 """
 
 import base64
+import contextlib
 import dataclasses
 import hashlib
 import hmac
@@ -13,6 +14,7 @@ import html
 import http.server
 import json
 import secrets
+import socket
 import ssl
 import subprocess
 import sys
@@ -97,12 +99,14 @@ class Scripted:
         threading.Thread(target=server.serve_forever, args=(0.05,), daemon=True).start()
         self._servers.append(server)
 
-    def stop(self):
+    def stop(self, but=None):
+        """Nobody listens any more, and connections are cut; `but` is one that is left."""
         self.release()
         while self._servers:
             server = self._servers.pop()
             server.shutdown()
             server.server_close()
+            server.hang_up(but)
 
     def release(self):
         """Lets the requests go that a silent token endpoint holds; they get no answer."""
@@ -164,6 +168,9 @@ class Scripted:
     def agree(self, tab):
         """Asks nothing after name and password."""
 
+    def agree_to_leave(self, tab):
+        """Nor at the logout."""
+
     # -- the endpoints ---------------------------------------------------------------------
 
     def authorization(self, name, query, form):
@@ -181,8 +188,6 @@ class Scripted:
             return 403, {}, LOGIN_PAGE.format(action=action, hint="Wrong name or password.")
         code = secrets.token_urlsafe(16)
         self._codes[code] = (name, query.get("nonce"))
-        if self.script.leave:
-            self.stop()
         return self._back(query, {"code": code})
 
     def _back(self, query, values):
@@ -245,6 +250,25 @@ class Scripted:
 class _Server(http.server.ThreadingHTTPServer):
     daemon_threads = True
 
+    def __init__(self, *arguments):
+        self._open = set()
+        super().__init__(*arguments)
+
+    def process_request(self, request, client_address):
+        self._open.add(request)
+        super().process_request(request, client_address)
+
+    def shutdown_request(self, request):
+        self._open.discard(request)
+        super().shutdown_request(request)
+
+    def hang_up(self, but):
+        """A browser connects before it knows what to ask: that connection would be served."""
+        for request in list(self._open):
+            if request is not but:
+                with contextlib.suppress(OSError):
+                    request.shutdown(socket.SHUT_RDWR)
+
     def handle_error(self, request, client_address):
         """Who does not like the certificate hangs up: no mistake of the provider."""
         if not isinstance(sys.exc_info()[1], OSError):
@@ -279,7 +303,10 @@ class _Handler(http.server.BaseHTTPRequestHandler):
         elif not self.provider.known(name):
             self._send(404, {}, "")
         elif path == "authorization":
-            self._send(*self.provider.authorization(name, query, form))
+            answer = self.provider.authorization(name, query, form)
+            if form is not None and self.provider.script.leave:
+                self.provider.stop(self.connection)
+            self._send(*answer)
         elif path == "token" and form is not None:
             self._send_document(*self.provider.token(name, form))
         elif path in ("wellknown", "keys"):

@@ -31,7 +31,10 @@ class Scenario(DeviceTest):
 
     def _no_complaints(self):
         """No script of the device failed, and none of its pages broke its own policy."""
-        own = [text for text in self.tab.complaints() if text.startswith(self.device.stage.device)]
+        # A violation does not always say which page it was; a provider of flesh has some of its own.
+        own = [text for text in self.tab.complaints()
+               if not text.startswith((self.device.provider.url, self.device.stage.device +
+                                       "/favicon.ico"))]
         self.assertEqual(own, [])
 
     def change_setting(self, profile, **values):
@@ -65,6 +68,7 @@ class Scenario(DeviceTest):
 
     def sign_out(self):
         self.tab.click("#sign-out button")
+        self.device.provider.agree_to_leave(self.tab)
 
     # -- what comes of it ------------------------------------------------------------------
 

@@ -13,7 +13,7 @@ USED_UP = "login was not started in this browser, or is used up"
 OTHER_STATE = "state does not belong to this login"
 MARKUP = "<img src=x onerror=\"document.title='owned'\"><script>document.title='owned'</script>"
 FOREIGN = ("https://evil.localhost/", "//evil.localhost/", "/\\evil.localhost",
-           "javascript:document.title='owned'", "data:text/html,owned", "\t//evil.localhost/")
+           "javascript:document.title='owned'", "data:text/html,owned")
 
 
 class Callbacks(Scenario):
@@ -116,7 +116,7 @@ class Links(Scenario):
                 self.assert_out()
 
     def test_foreign_origin_in_the_fragment(self):
-        for origin in FOREIGN:
+        for origin in (*FOREIGN, "\t//evil.localhost/", "/\t/evil.localhost/", "/..//evil.localhost"):
             with self.subTest(origin=origin):
                 self.tab.open("about:blank")
                 self.tab.open(self.relay_url + "#success=true&origin=" +
@@ -169,9 +169,10 @@ class Links(Scenario):
             const image = document.createElement("img");
             image.src = arguments[0];
             document.body.append(image);""", self.device.provider.url + "/image.png")
-        refused = self.tab.wait(lambda: [text for text in self.tab.complaints()
-                                         if "Content Security Policy" in text], "a violation")
-        self.assertTrue(refused[0].startswith(self.device.stage.device), refused)
+        seen = []
+        self.tab.wait(lambda: seen.extend(self.tab.complaints()) or len(seen) > 1, "two violations")
+        self.assertIn("inline script violates", seen[0])
+        self.assertIn("/image.png' violates", seen[1])
         self.assertEqual(self.tab.title, "Not signed in")
         self.assertNotIn("/image.png", [path for _, path, _, _ in self.device.provider.seen])
 

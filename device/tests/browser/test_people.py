@@ -5,6 +5,7 @@ import unittest
 
 from device import device
 from providers.glewlwyd import Glewlwyd
+from providers.lemonldap import LemonLDAP
 from scenario import Scenario
 
 PHONE = {"width": 320, "height": 568, "deviceScaleFactor": 2, "mobile": True}
@@ -36,8 +37,9 @@ class OnScripted(Road, Scenario):
     pass
 
 
-class OnGlewlwyd(Road, Scenario):
-    provider = Glewlwyd
+class Visited(Road):
+    """With a provider that was not written for these tests."""
+    provider = None
 
     @classmethod
     def setUpClass(cls):
@@ -46,6 +48,14 @@ class OnGlewlwyd(Road, Scenario):
     @classmethod
     def tearDownClass(cls):
         device().come_home()
+
+
+class OnGlewlwyd(Visited, Scenario):
+    provider = Glewlwyd
+
+
+class OnLemonLDAP(Visited, Scenario):
+    provider = LemonLDAP
 
 
 class AtThePage(Scenario):
