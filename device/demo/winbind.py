@@ -9,8 +9,9 @@ import sys
 import time
 
 from browser import BrowserError
-from demo import DEVICE, PROVIDER, Demo, SignIn, StepError, say, show_logs
 from directory import Directory
+from scene import DEVICE, PROVIDER, Scene, StepError, say, show_logs
+from sign_in import SignIn
 from stage import Stage, StageError
 
 # The NetBIOS name is not the first label of the DNS name: nothing but the directory knows it.
@@ -42,8 +43,8 @@ FAILURES = (CheckError, StageError, BrowserError, StepError, subprocess.TimeoutE
 
 
 class Checks:
-    def __init__(self, demo, directory, convert):
-        self.demo, self.directory, self.convert = demo, directory, convert
+    def __init__(self, scene, directory, convert):
+        self.scene, self.directory, self.convert = scene, directory, convert
         self.passed = self.failed = 0
 
     def check(self, what, action, *arguments):
@@ -58,8 +59,8 @@ class Checks:
             say(f"ok      {what}")
 
     def show_logs(self):
-        show_logs(self.demo.stage)
-        print("-- samba\n   " + self.demo.stage.tail("samba"), file=sys.stderr)
+        show_logs(self.scene.stage)
+        print("-- samba\n   " + self.scene.stage.tail("samba"), file=sys.stderr)
 
     # -- the conversion alone --------------------------------------------------------------
 
@@ -80,13 +81,13 @@ class Checks:
     # -- the whole sign-in -----------------------------------------------------------------
 
     def signs_in(self, road):
-        self.demo.use_road(road)
-        SignIn(self.demo, "azure", road).run()
+        self.scene.use_road(road)
+        SignIn(self.scene, "azure", road).run()
 
     def refused(self, principal, reason=REFUSAL):
-        self.demo.provider.change_claim("unique_name", principal)
-        logged = len(self.demo.stage.log.lines)
-        attempt = SignIn(self.demo, "azure", "checked")
+        self.scene.provider.change_claim("unique_name", principal)
+        logged = len(self.scene.stage.log.lines)
+        attempt = SignIn(self.scene, "azure", "checked")
         try:
             attempt.run()
         except StepError as error:
@@ -95,21 +96,21 @@ class Checks:
         else:
             raise CheckError("signed in")
         self._expect_logged(reason, logged)
-        page = attempt.browser.get(self.demo.stage.device + "/index.cgi")
+        page = attempt.browser.get(self.scene.stage.device + "/index.cgi")
         if "Nobody is signed in" not in page.text:
             raise CheckError("the device page says: " + page.text)
 
     def _expect_logged(self, text, first):
         """The log is read by a thread of its own, which may be behind."""
         end = time.monotonic() + 10
-        while not any(text in line for line in self.demo.stage.log.lines[first:]):
+        while not any(text in line for line in self.scene.stage.log.lines[first:]):
             if time.monotonic() > end:
                 raise CheckError("nothing in the system log")
             time.sleep(0.05)
 
     def given_up(self, principal):
         """Winbind is there and does not answer: the login program's own limit counts."""
-        self.demo.use_road("checked", SSO_LOGIN_DEADLINE="2")
+        self.scene.use_road("checked", SSO_LOGIN_DEADLINE="2")
         self.directory.freeze()
         try:
             self.refused(principal, "provider did not answer in time")
@@ -117,7 +118,7 @@ class Checks:
             self.directory.thaw()
 
     def known(self):
-        if not self.directory.knows_user(self.demo.expected["azure"]):
+        if not self.directory.knows_user(self.scene.expected["azure"]):
             raise CheckError("unknown")
         if self.directory.knows_user(f"{NETBIOS}\\nobody-there"):
             raise CheckError("it knows everybody")
@@ -130,7 +131,7 @@ class Checks:
         self.conversions()
         self.check("the NetBIOS name for the domain: refused", self.refused, f"alice@{NETBIOS}")
         self.check("a domain that nobody knows: refused", self.refused, "alice@plant7.example.net")
-        self.demo.provider.change_claim("unique_name", principal)
+        self.scene.provider.change_claim("unique_name", principal)
         for road in ("plain", "checked"):
             self.check(f"{principal} signs in as {NETBIOS}\\alice, {road}", self.signs_in, road)
         self.check("the directory knows this user by that name", self.known)
@@ -149,13 +150,13 @@ def main():
     options = parser.parse_args()
 
     stage = Stage(DEVICE, PROVIDER, 8443, 8444)
-    demo = Demo(stage)
-    demo.expected["azure"] = f"{NETBIOS}\\alice"
+    scene = Scene(stage)
+    scene.expected["azure"] = f"{NETBIOS}\\alice"
     directory = Directory(stage, DNS, NETBIOS)
-    checks = Checks(demo, directory, options.convert)
+    checks = Checks(scene, directory, options.convert)
     try:
-        demo.set_up(options.prefix, options.programs, options.pages)
-        demo.choose("azure")
+        scene.set_up(options.prefix, options.programs, options.pages)
+        scene.choose("azure")
         directory.begin()
         checks.run()
     except FAILURES as error:

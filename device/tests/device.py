@@ -12,8 +12,8 @@ HERE = os.path.dirname(os.path.abspath(__file__))
 sys.path.insert(0, os.path.join(HERE, "..", "demo"))
 
 from browser import Browser  # noqa: E402
-from demo import DEVICE, PROVIDER, Client, Person, settings_of  # noqa: E402
 from providers.scripted import Script, Scripted  # noqa: E402
+from scene import DEVICE, PROVIDER, Client, Person, settings_of  # noqa: E402
 from servers import Lighttpd  # noqa: E402
 from stage import WWW, Stage  # noqa: E402
 

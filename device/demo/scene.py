@@ -1,0 +1,115 @@
+"""The scene: the device, its clients at a provider, and a person who is known there."""
+
+import dataclasses
+import re
+import secrets
+import sys
+import time
+import urllib.parse
+
+from providers.glewlwyd import Glewlwyd
+from servers import Lighttpd
+
+DEVICE, PROVIDER = "device.localhost", "provider.localhost"
+STARTED = time.monotonic()
+
+
+class StepError(Exception):
+    """A step of the sign-in ended in another way than it should."""
+
+
+@dataclasses.dataclass
+class Person:
+    account: str
+    password: str
+    email: str
+    claims: dict
+
+
+@dataclasses.dataclass
+class Client:
+    identity: str
+    secret: str
+    redirect_uri: str
+    logout_uri: str
+
+
+def say(text):
+    print(f"[{time.monotonic() - STARTED:5.1f}s] {text}", flush=True)
+
+
+def shown(url):
+    """A URL for the eye: long values are cut, the code is not shown at all."""
+    url = re.sub(r"([?&]code=)[^&]*", r"\1...", url)
+    return re.sub(r"=([^&=#]{28})[^&#]{8,}", r"=\1...", url)
+
+
+def values_of(url):
+    parts = urllib.parse.urlsplit(url)
+    return dict(urllib.parse.parse_qsl(parts.query or parts.fragment))
+
+
+def settings_of(name, client, endpoints, person):
+    """The content of a client's settings file."""
+    azure = {"azure_sso_enable": True, "azure_tenant_id": person.claims["tid"]}
+    # The library adds the way back to Azure's logout alone; for WebSphere it is configured.
+    logout = endpoints["logout"] + ("" if name == "azure" else "?post_logout_redirect_uri=" +
+                                    urllib.parse.quote(client.logout_uri, safe=""))
+    return {
+        f"{name}_wellknown": endpoints["wellknown"],
+        f"{name}_client_id": client.identity,
+        f"{name}_client_secret": client.secret,
+        f"{name}_authorization_endpoint": endpoints["authorization"],
+        f"{name}_token_endpoint": endpoints["token"],
+        f"{name}_redirect_uri": client.redirect_uri,
+        f"{name}_logout_endpoint": logout,
+        **(azure if name == "azure" else {})}
+
+
+class Scene:
+    def __init__(self, stage, provider=Glewlwyd):
+        self.stage = stage
+        self.person = Person("alice", secrets.token_urlsafe(9), "alice@plant7.example.net", {
+            "tid": "3f2a8f6e-demo-tenant", "unique_name": "alice@plant7.example.net"})
+        self.provider = provider(stage, self.person)
+        self.server = None
+        self.expected = {"azure": "PLANT7.EXAMPLE.NET\\alice", "websphere": "alice"}
+
+    def set_up(self, prefix, programs, pages):
+        say("device: private names, certificate authority, system log")
+        self.stage.build()
+        say(f"device: library, login program (set-id root), web server on {self.stage.device}")
+        self.stage.install(prefix, programs, pages)
+        self.use_road("checked")
+        say(f"provider: {self.provider.title} on {self.provider.url}")
+        self.provider.start()
+        self._clients()
+
+    def _client(self, name):
+        return Client(f"device-{name}", secrets.token_urlsafe(32),
+                      self.stage.device + "/webman/login.cgi",
+                      self.stage.device + "/webman/ssoclient/relay.html")
+
+    def _clients(self):
+        for name, add in (("azure", self.provider.add_azure),
+                          ("websphere", self.provider.add_websphere)):
+            client = self._client(name)
+            self.stage.configure(name, settings_of(name, client, add(client), self.person))
+
+    def choose(self, profile):
+        self.stage.configure("profile", {"sso_enable": True, "sso_profile": profile}, 0o644)
+
+    def use_road(self, road, **environment):
+        """Plain: the login program calls OIDCLogin. Checked: it also compares the nonce."""
+        if self.server is not None:
+            self.server.stop()
+        self.server = Lighttpd(self.stage)
+        self.server.start({"SSO_LOGIN_ROAD": road, **environment})
+
+
+def show_logs(stage):
+    print("-- system log", file=sys.stderr)
+    for line in (stage.log.lines if stage.log else [])[-20:]:
+        print("   " + line, file=sys.stderr)
+    for name in ("lighttpd", "glewlwyd", "lemonldap"):
+        print(f"-- {name}\n   " + stage.tail(name).replace(" | ", "\n   "), file=sys.stderr)
