@@ -203,17 +203,17 @@ class Stage:
         os.chmod(WWW + "/index.cgi", 0o755)
         for name in os.listdir(pages):
             shutil.copy(f"{pages}/{name}", WWW + "/webman/ssoclient")
-        self._install_login(programs + "/login.cgi", WWW + "/webman/login.cgi")
+        self.install_login(programs + "/login.cgi", WWW + "/webman/login.cgi", 0o4750)
         entry = pwd.getpwnam(WEB_USER)
         os.makedirs("/run/ssoclient", 0o700)
         os.chown("/run/ssoclient", entry.pw_uid, entry.pw_gid)
 
     @staticmethod
-    def _install_login(source, target):
-        """Set-id root, and for the web server's group alone: nobody else can start it."""
+    def install_login(source, target, mode):
+        """Root's, and for the web server's group alone: nobody else can start it."""
         shutil.copy(source, target)
         os.chown(target, 0, pwd.getpwnam(WEB_USER).pw_gid)
-        os.chmod(target, 0o4750)
+        os.chmod(target, mode)
 
     @staticmethod
     def _loader():

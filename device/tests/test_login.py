@@ -545,7 +545,89 @@ class Identity(DeviceTest):
             self.run_program("action=start", user=65534)
 
 
-def programs():
+class Launched(DeviceTest):
+    """The other way to the same identities: the launcher is set-id, the login program is not."""
+
+    PROGRAM = "/usr/qova/libexec/ssoclient-login"
+    BAIT = {"LD_PRELOAD": "/nowhere.so", "BASH_ENV": "/nowhere", "HTTP_PROXY": "http://evil:1"}
+
+    @classmethod
+    def setUpClass(cls):
+        build = os.environ["SSOCLIENT_BUILD"] + "/device/"
+        cls.stage = device().stage
+        os.makedirs(os.path.dirname(cls.PROGRAM), exist_ok=True)
+        cls.stage.install_login(build + "login.cgi", cls.PROGRAM, 0o750)
+        cls.stage.install_login(build + "launcher.cgi", LOGIN, 0o4750)
+        device().use(Lighttpd, SSO_LOGIN_DEADLINE=str(DEADLINE), **cls.BAIT)
+
+    @classmethod
+    def tearDownClass(cls):
+        os.unlink(cls.PROGRAM)
+        cls.stage.install_login(os.environ["SSOCLIENT_BUILD"] + "/device/login.cgi", LOGIN, 0o4750)
+        device().use(Lighttpd)
+
+    def test_signs_in_and_out(self):
+        for profile in ("azure", "websphere"):
+            with self.subTest(profile=profile):
+                self.device.choose(profile)
+                self.assert_signed_in(self.sign_in(), profile)
+                self.browser.post(self.device.login_url + "?action=logout", {})
+                self.assertIsNone(self.user())
+
+    def test_identities_and_environment(self):
+        """As for the set-id program; and of what the web server has set, only what is read."""
+        self.device.provider.script = Script(silent=("token",))
+        url = self.callback_url()
+        waiting = threading.Thread(target=self.browser.get, args=(url,))
+        waiting.start()
+        wait_until(lambda: any(path.endswith("/token")
+                               for _, path, _, _ in self.device.provider.seen))
+        running = programs("ssoclient-login")
+        self.assertEqual(len(running), 2)
+        for pid in running:
+            with open(f"/proc/{pid}/status", encoding="ascii") as status:
+                ids = {line.split()[0]: line.split()[1:4] for line in status if "id:" in line}
+            self.assertEqual(ids["Uid:"], ["33", "33", "0"])
+            self.assertEqual(ids["Gid:"], ["33", "33", "0"])
+            with open(f"/proc/{pid}/environ", encoding="ascii") as environ:
+                names = {pair.split("=")[0] for pair in environ.read().split("\0") if pair}
+            self.assertEqual(names, {"PATH", "REQUEST_METHOD", "QUERY_STRING", "HTTP_COOKIE",
+                                     "SSO_LOGIN_DEADLINE"})
+        waiting.join(20)
+        self.assertEqual(programs("ssoclient-login"), [])
+
+    def test_not_through_the_launcher(self):
+        out = self.run_program("action=start", path=self.PROGRAM)
+        self.assertIn("#reason=login%20program%20is%20not%20installed%20set-id%20root&", out)
+        with self.assertRaises(PermissionError):
+            self.run_program("action=start", path=self.PROGRAM, user=65534)
+
+    def refused(self, reason, **options):
+        self.assertRegex(self.run_program("action=start", **options),
+                         "^Status: 302 Found\n.*\nLocation: [^\n]*relay.html#success=false\n\n$")
+        line = "sign-in failed: " + reason
+        self.assertTrue(any(entry.endswith(line) for entry in self.log()), self.log())
+
+    def test_launcher_started_by_root(self):
+        self.refused("web server runs as root", user=0)
+
+    def test_launcher_not_set_id(self):
+        copy = os.path.dirname(LOGIN) + "/plain.cgi"
+        subprocess.run(["install", "-m", "755", LOGIN, copy], check=True)
+        self.addCleanup(os.unlink, copy)
+        self.refused("launcher is not installed set-id root", path=copy)
+
+    def test_launcher_for_the_web_server_alone(self):
+        with self.assertRaises(PermissionError):
+            self.run_program("action=start", user=65534)
+
+    def test_no_program(self):
+        os.rename(self.PROGRAM, self.PROGRAM + "-away")
+        self.addCleanup(os.rename, self.PROGRAM + "-away", self.PROGRAM)
+        self.refused("login program does not start")
+
+
+def programs(program="login.cgi"):
     """Process ids of the login programs that run, parents before children."""
     found = []
     for name in os.listdir("/proc"):
@@ -556,7 +638,7 @@ def programs():
                 stat = file.read()
         except OSError:
             continue
-        if "(login.cgi)" in stat and stat.split()[2] != "Z":
+        if f"({program})" in stat and stat.split()[2] != "Z":
             found.append(int(name))
     return sorted(found)
 
