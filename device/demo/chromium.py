@@ -20,12 +20,13 @@ from stage import StageError, run
 PATIENCE = 30  # seconds until a page that does not come is given up
 
 # The first line: root needs it, and the namespace is the sandbox here. The second: a small machine
-# without a screen. The rest: no word to anybody but the pages.
+# without a screen. The last: fewer processes. The rest: no word to anybody but the pages.
 FLAGS = ("--no-sandbox",
          "--headless", "--disable-gpu", "--disable-dev-shm-usage", "--hide-scrollbars",
          "--disable-quic", "--no-first-run", "--disable-background-networking",
          "--disable-component-update", "--disable-sync", "--disable-default-apps",
-         "--disable-extensions", "--no-proxy-server", "--lang=en-US")
+         "--disable-extensions", "--no-proxy-server", "--lang=en-US",
+         "--disable-site-isolation-trials", "--renderer-process-limit=1")
 
 # The relay page goes on by itself: what it showed is kept for who comes to look a moment later.
 KEEP = """

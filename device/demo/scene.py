@@ -52,9 +52,6 @@ def values_of(url):
 def settings_of(name, client, endpoints, person):
     """The content of a client's settings file."""
     azure = {"azure_sso_enable": True, "azure_tenant_id": person.claims["tid"]}
-    # The library adds the way back to Azure's logout alone; for WebSphere it is configured.
-    logout = endpoints["logout"] + ("" if name == "azure" else "?post_logout_redirect_uri=" +
-                                    urllib.parse.quote(client.logout_uri, safe=""))
     return {
         f"{name}_wellknown": endpoints["wellknown"],
         f"{name}_client_id": client.identity,
@@ -62,7 +59,7 @@ def settings_of(name, client, endpoints, person):
         f"{name}_authorization_endpoint": endpoints["authorization"],
         f"{name}_token_endpoint": endpoints["token"],
         f"{name}_redirect_uri": client.redirect_uri,
-        f"{name}_logout_endpoint": logout,
+        f"{name}_logout_endpoint": endpoints["logout"],
         **(azure if name == "azure" else {})}
 
 

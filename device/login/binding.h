@@ -3,6 +3,9 @@
 // A random value goes into a cookie, and its digest into the state. Whoever comes back with a
 // state must bring the cookie too: a link with somebody else's code and state (login cross-site
 // request forgery, code injection) is of no use in another browser. Each cookie serves once.
+//
+// There is one cookie, so there is one login at a time: of two that are under way in two tabs, the
+// first is refused when it comes back, and uses up the second one's ticket.
 #pragma once
 
 #include <json/value.h>

@@ -96,6 +96,9 @@ void Logout(const cgi::Request& request) {
     url = GetAzureSSOLogoutURL(site + "/index.cgi");
   } else {
     url = profile.GetSSOClient()->GetLogoutEndpoint();
+    if (!url.empty() && !site.empty()) {  // the library adds the way back to Azure's alone
+      url += "?post_logout_redirect_uri=" + URLEncode(site + kPages + "ssoclient/relay.html");
+    }
   }
   if (url.empty()) url = std::string(kPages) + "ssoclient/relay.html";
   cgi::Redirect(url, {cookie});
