@@ -24,10 +24,28 @@ std::string quoted(const std::string& text) {
   return Json::Value(text).toStyledString();
 }
 
-// The names of RFC 7518, section 3.1, and of its successors, but for the two families in use.
-const std::vector<std::string> kOtherNames = {"ES256",  "ES384",  "ES512",    "PS256",  "PS384",
-                                              "PS512",  "none",   "EdDSA",    "ES256K", "dir",
-                                              "A256KW", "RSA1_5", "RSA-OAEP", "A128GCM"};
+// The names of RFC 7518, section 3.1, and of its successors, but for the two families in use; and
+// the other names of these, from its appendix A.1.
+const std::vector<std::string> kOtherNames = {"ES256",
+                                              "ES384",
+                                              "ES512",
+                                              "PS256",
+                                              "PS384",
+                                              "PS512",
+                                              "none",
+                                              "EdDSA",
+                                              "ES256K",
+                                              "dir",
+                                              "A256KW",
+                                              "RSA1_5",
+                                              "RSA-OAEP",
+                                              "A128GCM",
+                                              "http://www.w3.org/2001/04/xmldsig-more#hmac-sha256",
+                                              "HmacSHA256",
+                                              "1.2.840.113549.2.9",
+                                              "http://www.w3.org/2001/04/xmldsig-more#rsa-sha256",
+                                              "SHA256withRSA",
+                                              "1.2.840.113549.1.1.11"};
 
 TYPED_TEST(AttackHeader, NamesNoAlgorithmButTheClientsOwnThree) {
   std::vector<std::string> names = kOtherNames;

@@ -554,7 +554,7 @@ const std::vector<Recipe> kDocuments = {
                             "\"",
                             "nul",
                             "tru",
-                            "--",
+
                             "{\"keys\":[}"}));
        m.endLost();
      }},
@@ -566,7 +566,8 @@ const std::vector<Recipe> kDocuments = {
     {"no object",
      [](Maker& m) {
        m.give(m.random.one({"null", "true", "0", "-5", "502 Bad Gateway", "\"id_token\"", "[]",
-                            "[\"keys\"]", "[{\"keys\":[]}]", "1.5e3", "[[[]]]", "\"jwks_uri\""}));
+                            "[\"keys\"]", "[{\"keys\":[]}]", "1.5e3", "[[[]]]", "--",
+                            "\"jwks_uri\""}));
        m.end({m.place == kToken ? kNoIdToken : kNoKey});
      }},
     {"nested too deep",
@@ -1020,7 +1021,7 @@ std::size_t kinds() {
 }
 
 Case makeCase(const World& world, std::uint64_t seed, std::uint64_t index) {
-  const Recipe& recipe = *recipes()[index % kinds()];
+  const Recipe& recipe = *recipes()[static_cast<std::size_t>(index % kinds())];
   Maker maker(world, seed, index);
   recipe.make(maker);
   return maker.finished(recipe.name);
