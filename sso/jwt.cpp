@@ -12,7 +12,6 @@
 
 #include <algorithm>
 #include <cstring>
-#include <string_view>
 #include <utility>
 
 #include "sso/json.h"
@@ -99,12 +98,13 @@ Json::Value ParseSegment(const std::string& segment, const char* failure) {
   return value;
 }
 
-// The text that was signed, in pieces: the two segments as they stand in the token, and the dot
-// between them. It ends at the first zero byte.
-SSO::Pieces<3> SigningInput(const std::string& header, const std::string& body) {
-  const std::string_view front = header.c_str();
-  if (front.size() < header.size()) return {front, "", ""};
-  return {front, ".", body.c_str()};
+// The text that was signed: the two segments as they stand in the token, up to a zero byte.
+std::string SigningInput(const std::string& header, const std::string& body) {
+  std::string input;
+  input.reserve(header.size() + 1 + body.size());
+  input.append(header).append(1, '.').append(body);
+  input.resize(strlen(input.c_str()));
+  return input;
 }
 
 // An RSA key that owns both numbers; null if it cannot be made.
@@ -134,14 +134,7 @@ PublicKey MakePublicKey(RSAKey rsa) {
   return key;
 }
 
-// Digests the pieces one by one: joined first, a large token would be copied for nothing.
-bool UpdateDigest(EVP_MD_CTX* context, const SSO::Pieces<3>& input) {
-  return std::all_of(input.begin(), input.end(), [=](std::string_view piece) {
-    return EVP_DigestUpdate(context, piece.data(), piece.size()) == 1;
-  });
-}
-
-bool VerifyDigest(const SSO::Pieces<3>& input, const Bytes& signature, EVP_PKEY* key,
+bool VerifyDigest(const std::string& input, const Bytes& signature, EVP_PKEY* key,
                   const EVP_MD* md) {
   const DigestContext context(EVP_MD_CTX_new());
   if (context == nullptr) return false;
@@ -149,7 +142,7 @@ bool VerifyDigest(const SSO::Pieces<3>& input, const Bytes& signature, EVP_PKEY*
     syslog(LOG_ERR, "%s:%d EVP_DigestVerifyInit failed", kUnit, __LINE__);
     return false;
   }
-  if (!UpdateDigest(context.get(), input)) {
+  if (EVP_DigestUpdate(context.get(), input.data(), input.size()) != 1) {
     syslog(LOG_ERR, "%s:%d EVP_DigestVerifyUpdate failed", kUnit, __LINE__);
     return false;
   }
@@ -161,7 +154,7 @@ bool VerifyDigest(const SSO::Pieces<3>& input, const Bytes& signature, EVP_PKEY*
   return true;
 }
 
-bool VerifyRSA(const SSO::Pieces<3>& input, const std::string& n, const std::string& e,
+bool VerifyRSA(const std::string& input, const std::string& n, const std::string& e,
                const std::string& signature, const EVP_MD* md) {
   const Bytes modulus(n);
   const Bytes exponent(e);
@@ -191,15 +184,11 @@ bool Base64UrlEncode(const unsigned char* bytes, unsigned count, std::string& te
   return true;
 }
 
-bool VerifyHMAC(const SSO::Pieces<3>& pieces, const std::string& key_text,
-                const std::string& signature, const EVP_MD* md) {
+bool VerifyHMAC(const std::string& input, const std::string& key_text, const std::string& signature,
+                const EVP_MD* md) {
   const Bytes key(key_text);
   // A text that decodes to nothing must not pass as the empty key.
   if (key.missing() || key.size() == 0) return false;
-
-  std::string input;
-  input.reserve(pieces[0].size() + pieces[1].size() + pieces[2].size());
-  for (const std::string_view piece : pieces) input += piece;
 
   unsigned char mac[EVP_MAX_MD_SIZE];
   unsigned count = 0;
