@@ -1,9 +1,11 @@
 // What an attacker writes into a token's header: algorithms, key identifiers, keys of his own.
 #include <gtest/gtest.h>
+#include <openssl/evp.h>
 
 #include <string>
 #include <vector>
 
+#include "sso/jwt.h"
 #include "support/bench.h"
 #include "support/provider.h"
 
@@ -218,6 +220,36 @@ TEST_F(AttackWebSphereHeader, FindsNoEmptyKeyBehindABadSecret) {
     test::configure<test::WebSphere>(settings);
     EXPECT_TRUE(refuses<QOVA::SSO::sso_op_failed>("encode base64 failed.", forged)) << size;
   }
+}
+
+// All short texts as keys: those that stand for no bytes are no key at all, and above all not the
+// empty one. Zero bytes are the empty key to HMAC, whatever their number: texts of "A" stand for
+// them. (Where pads stand in the wrong place, OpenSSL's reading counts, which is zero bytes too.)
+TEST(AttackKeyText, ThatStandsForNothingIsNotTheEmptyKey) {
+  const std::string input = test::signingInput("{}", "{}");
+  const std::string forged = input + "." + base64url(test::hmac("", input, "SHA256"));
+  const std::string alphabet = "ABQ-_!\n %";
+  unsigned accepted = 0;
+  for (size_t length = 0; length <= 4; ++length) {
+    size_t count = 1;
+    for (size_t i = 0; i < length; ++i) count *= alphabet.size();
+    for (size_t number = 0; number < count; ++number) {
+      std::string key;
+      for (size_t rest = number; key.size() < length; rest /= alphabet.size())
+        key += alphabet[rest % alphabet.size()];
+      const bool zeros = length > 1 && key.find_first_not_of("AB") == std::string::npos &&
+                         test::fromBase64(key).find_first_not_of('\0') == std::string::npos;
+      QOVA::JWT::Jwt jwt(forged);
+      try {
+        jwt.JwtHMACVerify(key, EVP_sha256());
+        EXPECT_TRUE(zeros) << testing::PrintToString(key);
+        ++accepted;
+      } catch (const QOVA::JWT::jwt_verify_failed&) {
+        EXPECT_FALSE(zeros) << testing::PrintToString(key);
+      }
+    }
+  }
+  EXPECT_EQ(accepted, 5u);  // AA, AB, AAA, AAB, AAAA
 }
 
 class AttackKid : public AttackAzureHeader {
