@@ -69,15 +69,15 @@ const char* const kCanNotFail[] = {
     "memcmp", "memcpy", "memmove", "memset", "memchr", "strchr", "strcmp", "strlen", "strnlen",
     "memrchr", "bcmp",
     // one way out
-    "syslog", "__syslog_chk", "abort", "__stack_chk_fail", "_Unwind_Resume",
+    "syslog", "__syslog_chk", "abort", "__stack_chk_guard", "__stack_chk_fail", "_Unwind_Resume",
     // libcurl is in the program already when it is looked for
     "dlopen", "dlsym", "dlerror"};
 
 // The C++ run time and jsoncpp fail for want of memory alone.
-const char* const kRunTimes[] = {"_ZNSt",  "_ZNKSt", "_ZNSi",  "_ZNSo",   "_ZSt",     "_ZTI",
-                                 "_ZTT",   "_ZTV",   "_ZTS",   "_ZdaPv",  "_ZdlPv",   "__cxa_",
-                                 "__gxx_", "_ITM_",  "__gmon", "__gcov_", "_ZN4Json", "_ZNK4Json",
-                                 "_ZNKR",  "_ZNR",   "_ZGV"};
+const char* const kRunTimes[] = {"_ZNSt",    "_ZNSa",     "__aeabi_", "_ZNKSt", "_ZNSi",  "_ZNSo",
+                                 "_ZSt",     "_ZTI",      "_ZTT",     "_ZTV",   "_ZTS",   "_ZdaPv",
+                                 "_ZdlPv",   "__cxa_",    "__gxx_",   "_ITM_",  "__gmon", "__gcov_",
+                                 "_ZN4Json", "_ZNK4Json", "_ZNKR",    "_ZNR",   "_ZGV"};
 
 bool isKnown(const std::string& name) {
   if (canFail(name)) return true;

@@ -144,6 +144,9 @@ void startProvider(Operation::Server server) {
   provider->answer("/websphere-token", response(fixtures()["websphere token"]));
   provider->answer("/discovery", test::ok("{\"jwks_uri\":\"" + providerUrl("/keys") + "\"}"));
   provider->answer("/keys", test::ok("{\"keys\":[" + fixtures()["jwk"] + "]}"));
+  provider->answer("/bare-discovery",
+                   test::ok("{\"jwks_uri\":\"" + providerUrl("/bare-keys") + "\"}"));
+  provider->answer("/bare-keys", test::ok(R"({"keys":[{"kid":"the key of this year"}]})"));
   provider->answer("/text", test::ok("plain text of some length"));
   provider->start();
 }

@@ -95,10 +95,10 @@ std::string profileFile(const std::string& name) {
   return R"({"sso_enable":true,"sso_profile":")" + name + "\"}";
 }
 
-void writeAzure() {
+void writeAzure(const std::string& discovery = "/discovery") {
   Json::Value file;
   file["azure_sso_enable"] = true;
-  file["azure_wellknown"] = providerUrl("/discovery");
+  file["azure_wellknown"] = providerUrl(discovery);
   file["azure_client_id"] = "the device's own identifier";
   file["azure_client_secret"] = "the secret of the device";
   file["azure_tenant_id"] = "the tenant's own identifier";
@@ -138,6 +138,13 @@ void configureDisabled() {
 }
 void configureStranger() {
   configure(profileFile("another"));
+}
+// Discovery documents that are none, or name a key set whose key has no numbers.
+void configureTextForDiscovery() {
+  writeAzure("/text");
+}
+void configureBareKeys() {
+  writeAzure("/bare-discovery");
 }
 void configureNothing() {
   for (const char* const name : {"profile.conf", "azure.conf", "websphere.conf"}) {
@@ -444,12 +451,19 @@ void addAzure(std::vector<Operation>* all) {
   const Failures segments = decoding(kBadHeader) + decoding(kBadBody);
   const Failures keys = segments + transfer({kNoKey});
   const auto add = [&](const std::string& road, const std::string& token, const std::string& good,
-                       const Failures& failures, Server server) {
+                       const Failures& failures, Server server,
+                       const std::function<void()>& file = configureAzure) {
     Operation operation =
         verification<Azure>(road, token, good, failures, server != Server::kNone && road.empty());
     operation.server = server;
+    operation.configure = file;
     all->push_back(operation);
   };
+  add(", no discovery document", Azure::token(), kNoKey, segments, Server::kPlain,
+      configureTextForDiscovery);
+  add(", a key without numbers", Azure::token(),
+      "std::invalid_argument: RSA public 'n' cannot be found!", keys, Server::kPlain,
+      configureBareKeys);
   add("", Azure::token(), "ok", keys + rsa(), Server::kPlain);
   add(", a forged token", fixtures()["forged token"], kNoRSA, keys + rsa(), Server::kPlain);
   add(", an unknown key", fixtures()["stranger's token"], kNoKey, segments, Server::kPlain);
@@ -682,7 +696,8 @@ void addTransfers(std::vector<Operation>* all) {
 
 void addProviderRequests(std::vector<Operation>* all) {
   const auto discover = [&](const std::string& road, const Failures& failures,
-                            const std::string& good, Server server) {
+                            const std::string& good, Server server,
+                            const std::function<void()>& file) {
     all->push_back({"SSOClient::RequestWellknownInfo" + road, good, failures,
                     [](Run& run) {
                       AzureSSOClient client;
@@ -697,11 +712,13 @@ void addProviderRequests(std::vector<Operation>* all) {
                       }
                       run.expect(textOf(client) == before, "the client is unchanged");
                     },
-                    configureAzure, server});
+                    file, server});
   };
   discover("", transfer({"ok: before"}) + Failures{{"memory", {"ok: parts of it"}}},
-           "ok: the document", Server::kPlain);
-  discover(", no provider", {}, "ok: before", Server::kNone);
+           "ok: the document", Server::kPlain, configureAzure);
+  discover(", no provider", {}, "ok: before", Server::kNone, configureAzure);
+  discover(", not JSON", transfer({"ok: before"}), "ok: before", Server::kPlain,
+           configureTextForDiscovery);
 
   const auto exchange = [&](const std::string& road, const std::string& good, Server server) {
     all->push_back({"SSOClient::RequestTokenEndpoint" + road, good,
