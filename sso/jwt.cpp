@@ -98,14 +98,26 @@ Json::Value ParseSegment(const std::string& segment, const char* failure) {
   return value;
 }
 
-// The text that was signed: the two segments as they stand in the token, up to a zero byte.
-std::string SigningInput(const std::string& header, const std::string& body) {
-  std::string input;
-  input.reserve(header.size() + 1 + body.size());
-  input.append(header).append(1, '.').append(body);
-  input.resize(strlen(input.c_str()));
-  return input;
-}
+// The text that was signed: the two segments as they stand in the token, up to a zero byte. It is
+// put together in the body's memory, which has room for it (the token stood there), and lasts as
+// long as this object: a large token is not copied.
+class SigningInput {
+ public:
+  SigningInput(const std::string& header, std::string& segment)
+      : front(header.size() + 1), body(segment) {
+    body.insert(0, header + '.');
+  }
+  ~SigningInput() { body.erase(0, front); }
+  SigningInput(const SigningInput&) = delete;
+  SigningInput& operator=(const SigningInput&) = delete;
+
+  const unsigned char* data() const { return reinterpret_cast<const unsigned char*>(body.data()); }
+  size_t size() const { return strlen(body.c_str()); }
+
+ private:
+  const size_t front;
+  std::string& body;
+};
 
 // An RSA key that owns both numbers; null if it cannot be made.
 RSAKey MakeRSAKey(const Bytes& modulus, const Bytes& exponent) {
@@ -134,7 +146,7 @@ PublicKey MakePublicKey(RSAKey rsa) {
   return key;
 }
 
-bool VerifyDigest(const std::string& input, const Bytes& signature, EVP_PKEY* key,
+bool VerifyDigest(const SigningInput& input, const Bytes& signature, EVP_PKEY* key,
                   const EVP_MD* md) {
   const DigestContext context(EVP_MD_CTX_new());
   if (context == nullptr) return false;
@@ -154,7 +166,7 @@ bool VerifyDigest(const std::string& input, const Bytes& signature, EVP_PKEY* ke
   return true;
 }
 
-bool VerifyRSA(const std::string& input, const std::string& n, const std::string& e,
+bool VerifyRSA(const SigningInput& input, const std::string& n, const std::string& e,
                const std::string& signature, const EVP_MD* md) {
   const Bytes modulus(n);
   const Bytes exponent(e);
@@ -184,16 +196,15 @@ bool Base64UrlEncode(const unsigned char* bytes, unsigned count, std::string& te
   return true;
 }
 
-bool VerifyHMAC(const std::string& input, const std::string& key_text, const std::string& signature,
-                const EVP_MD* md) {
+bool VerifyHMAC(const SigningInput& input, const std::string& key_text,
+                const std::string& signature, const EVP_MD* md) {
   const Bytes key(key_text);
   // A text that decodes to nothing must not pass as the empty key.
   if (key.missing() || key.size() == 0) return false;
 
   unsigned char mac[EVP_MAX_MD_SIZE];
   unsigned count = 0;
-  if (HMAC(md, key.data(), key.size(), reinterpret_cast<const unsigned char*>(input.data()),
-           input.size(), mac, &count) == nullptr) {
+  if (HMAC(md, key.data(), key.size(), input.data(), input.size(), mac, &count) == nullptr) {
     return false;
   }
   std::string expected;

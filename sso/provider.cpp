@@ -9,6 +9,7 @@
 #include <utility>
 
 #include "platform/platform.h"
+#include "sso/encoding.h"
 #include "sso/json.h"
 #include "sso/jwt.h"
 #include "sso/nonce.h"
@@ -32,7 +33,7 @@ void AppendParameters(const ParameterSet& parameters, std::string& text) {
     text += '&';
     text += name;
     text += '=';
-    text += URLEncode(value);
+    AppendURLEncoded(value, text);
   }
 }
 

@@ -15,6 +15,7 @@
 #include <new>
 
 #include "platform/platform.h"
+#include "sso/encoding.h"
 #include "sso/json.h"
 #include "sso/libcurl.h"
 #include "sso/owned.h"
@@ -122,12 +123,20 @@ void httpPost(const std::string& url, const std::string& body, std::string& resp
   Transfer(url, &body, response, verifySSL, writeFn);
 }
 
-std::string URLEncode(const std::string& text) {
-  const size_t capacity = 3 * text.size();
+void AppendURLEncoded(const std::string& value, std::string& text) {
+  const size_t capacity = 3 * value.size();
   const CText encoded(static_cast<char*>(std::calloc(capacity + 1, 1)));
-  if (encoded == nullptr) return text;
-  if (QOVACGIURLEncode(text.c_str(), encoded.get(), capacity) != 0) return text;
-  return encoded.get();
+  if (encoded != nullptr && QOVACGIURLEncode(value.c_str(), encoded.get(), capacity) == 0) {
+    text += encoded.get();
+  } else {
+    text += value;  // unencoded: callers cannot tell
+  }
+}
+
+std::string URLEncode(const std::string& text) {
+  std::string encoded;
+  AppendURLEncoded(text, encoded);
+  return encoded;
 }
 
 std::string MD5Digest(std::string text) {
