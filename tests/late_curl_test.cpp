@@ -38,7 +38,12 @@ class Folder {
   Folder& operator=(const Folder&) = delete;
 
   std::string library() const { return path / "libcurl.so.4"; }
-  std::string variable() const { return "LD_LIBRARY_PATH=" + path.string(); }
+  // Before the folders of this run, where there are any: a library that is measured stands there.
+  std::string variable() const {
+    const char* const others = std::getenv("LD_LIBRARY_PATH");
+    return "LD_LIBRARY_PATH=" + path.string() + (others != nullptr ? ":" : "") +
+           (others != nullptr ? others : "");
+  }
 
  private:
   fs::path path;
