@@ -16,8 +16,10 @@ make_fresh_base() {
   quietly "debootstrap of $suite" \
     debootstrap --merged-usr --variant=minbase "$suite" "$fresh_base" || die "debootstrap failed"
   # A minimal system has no updates and security suites; a fresh installation has.
-  [ $# -ne 0 ] || cp /etc/apt/sources.list.d/debian.sources "$fresh_base/etc/apt/sources.list.d/" 2>/dev/null &&
-    : >"$fresh_base/etc/apt/sources.list" || true
+  if [ $# -eq 0 ] && cp /etc/apt/sources.list.d/debian.sources \
+    "$fresh_base/etc/apt/sources.list.d/" 2>/dev/null; then
+    : >"$fresh_base/etc/apt/sources.list"
+  fi
   rm -rf "$fresh_base"/var/cache/apt/archives/*.deb
   touch "$fresh_base/.complete"
 }
