@@ -24,4 +24,5 @@ do_install:append() {
 PACKAGES =+ "${PN}-doctor"
 FILES:${PN}-doctor = "${bindir}/ssoclient-doctor"
 FILES:${PN} += "${prefix}/qova"
-RDEPENDS:${PN} = "ca-certificates"
+# The library loads libcurl at its first request: nothing derives that.
+RDEPENDS:${PN} = "ca-certificates libcurl"
