@@ -9,6 +9,7 @@ speaks TLS; and the provider.
 
 import os
 import secrets
+import shutil
 import socket
 import ssl
 import sys
@@ -24,7 +25,7 @@ from servers import Busybox  # noqa: E402
 from stage import BUNDLE, SETTINGS, Stage, StageError, run, write  # noqa: E402
 
 EXPECTED = {"azure": "PLANT7.EXAMPLE.NET\\alice", "websphere": "alice"}
-MOUNTED = "/run/stage/image"
+MOUNTED = "/mnt"
 
 
 class Image(Busybox):
@@ -32,7 +33,7 @@ class Image(Busybox):
     PORT = 8080
 
     def start(self, environment):
-        self.stage.spawn("busybox", ["chroot", MOUNTED, "/etc/init.d/rcS"],
+        self.stage.spawn("busybox", [shutil.which("chroot"), MOUNTED, "/etc/init.d/rcS"],
                          environment={"PATH": "/bin", **environment})
         self.stage.wait_for("busybox", self.PORT)
         context = ssl.create_default_context(ssl.Purpose.CLIENT_AUTH)
@@ -41,9 +42,7 @@ class Image(Busybox):
         threading.Thread(target=self._accept, args=(context, self.PORT), daemon=True).start()
 
 
-def mount_image(image):
-    os.makedirs(MOUNTED)
-    run("mount", "-o", "loop,ro", image, MOUNTED)
+def surround():
     for path in ("/etc/hosts", SETTINGS, "/dev"):
         run("mount", "--bind", path, MOUNTED + path)
     run("mount", "-t", "proc", "proc", MOUNTED + "/proc")
@@ -82,6 +81,8 @@ def sign_in(stage, provider, server, name):
 
 
 def main():
+    # Before the stage is built: it has no loop devices.
+    run("mount", "-o", "loop,ro", os.path.abspath(sys.argv[1]), MOUNTED)
     stage = Stage(DEVICE, PROVIDER, 8443, 8444)
     stage.build()
     person = Person("alice", secrets.token_urlsafe(9), "alice@plant7.example.net", {
@@ -89,7 +90,7 @@ def main():
     provider = Scripted(stage, person)
     server = Image(stage)
     try:
-        mount_image(os.path.abspath(sys.argv[1]))
+        surround()
         provider.start()
         server.start({})
         configure(stage, provider, person, server.login)
