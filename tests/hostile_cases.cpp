@@ -380,15 +380,24 @@ const std::vector<Recipe> kMessages = {
      }},
     {"a redirect",
      [](Maker& m) {
-       const std::string status =
-           m.random.one({"301 Moved", "302 Found", "303 See Other", "307 Temporary",
-                         "308 Permanent", "300 Choices", "305 Proxy"});
-       const std::string target = m.random.one({"", "http://localhost:80", "file://"});
-       const std::string location =
-           m.random.one({"Location", "Refresh", "Content-Location", "URI"});
-       const std::string body = m.random.one({"", "<html>moved</html>", "moved"});
-       m.script().bytes = http(
-           body, status, location + ": " + (target.empty() ? m.world.base : target) + "/stray\r\n");
+       const std::string status = m.random.one(
+           {"301 Moved", "302 Found", "303 See Other", "307 Temporary", "308 Permanent"});
+       m.script().bytes =
+           http(m.random.one({"", "<html>moved</html>", "moved"}), status,
+                "Location: " + m.random.one({"", m.world.base.c_str()}) + "/stray\r\n");
+       m.endLost();
+     }},
+    {"another way to lead elsewhere",
+     [](Maker& m) {
+       const std::string status = m.random.one({"200 OK", "201 Created", "300 Choices", "305 Proxy",
+                                                "401 Unauthorized", "407 Proxy", "503 Later"});
+       const std::string header = m.random.one(
+           {"Location: ", "Refresh: 0; url=", "Content-Location: ", "URI: ", "Link: rel=next; ",
+            "WWW-Authenticate: Basic realm="});
+       const std::string target =
+           m.random.one({m.world.base.c_str(), "http://localhost:80", "file://", "//localhost"});
+       m.script().bytes = http(m.random.one({"", "<html>moved</html>", "moved"}), status,
+                               header + target + "/stray\r\n");
        m.endLost();
      }},
     {"an error status without a body",
