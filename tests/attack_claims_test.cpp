@@ -249,7 +249,7 @@ TYPED_TEST(AttackClaims, MayBeHuge) {
       this->invalid(kWrongClient, this->withBody(this->open() + ",\"aud\":\"" + big + "\"}")));
   EXPECT_TRUE(this->doubts(this->withBody(test::kBenchBody) + big));
   EXPECT_TRUE(this->invalid("bad jwt format!", std::string(1 << 20, '.')));
-  EXPECT_LT(std::clock() - start, 20 * CLOCKS_PER_SEC);
+  EXPECT_LT(std::clock() - start, 60 * CLOCKS_PER_SEC);
 }
 
 // RFC 3629: none of these bytes is text. They are no reason to refuse, nor do they make two

@@ -220,7 +220,7 @@ TEST_F(AttackNumbers, HugeOnesCostAMomentAtMost) {
     expectRefused(std::string(bits / 8, '\1'), n, e);
     expectRefused(good, n, exponentOfAllOnes(bits));
   }
-  EXPECT_LT(std::clock() - start, 20 * CLOCKS_PER_SEC);
+  EXPECT_LT(std::clock() - start, 60 * CLOCKS_PER_SEC);
 }
 
 TEST_F(AttackNumbers, AreTakenOrLeftAsOpenSSLDoes) {
