@@ -29,7 +29,7 @@ struct DlopenNote {
   alignas(4) char json[sizeof DEPENDENCY];
 };
 
-__attribute__((used, section(".note.dlopen"))) alignas(4) const DlopenNote kDlopenNote = {
+alignas(4) __attribute__((used, section(".note.dlopen"))) const DlopenNote kDlopenNote = {
     sizeof kDlopenNote.name, sizeof kDlopenNote.json, 0x407c0c0a, "FDO", DEPENDENCY};
 
 // Finds one function in `library` and counts those that are missing.

@@ -19,8 +19,8 @@ HERE = os.path.dirname(os.path.abspath(__file__))
 sys.path.insert(0, os.path.join(HERE, "..", "..", "device", "demo"))
 
 from browser import Browser  # noqa: E402
-from demo import DEVICE, PROVIDER, Client, Person, settings_of, values_of  # noqa: E402
 from providers.scripted import Scripted  # noqa: E402
+from scene import DEVICE, PROVIDER, Client, Person, settings_of, values_of  # noqa: E402
 from servers import Busybox  # noqa: E402
 from stage import BUNDLE, SETTINGS, Stage, StageError, run, write  # noqa: E402
 
