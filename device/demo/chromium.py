@@ -11,7 +11,6 @@ import time
 from selenium import webdriver
 from selenium.common.exceptions import WebDriverException
 from selenium.webdriver.chrome.service import Service
-from selenium.webdriver.common.by import By
 from selenium.webdriver.common.keys import Keys
 from selenium.webdriver.remote.remote_connection import RemoteConnection
 
@@ -113,9 +112,15 @@ class Tab:
                 raise TabError(f"{url} does not open: {error.msg}") from error
 
     def type(self, field, text):
+        """Types a text into a field, key by key."""
         element = self.find(field)
         element.clear()
         element.send_keys(text)
+
+    def paste(self, field, text):
+        """Puts a text into a field at once: key by key takes most of a test's time."""
+        self.script("arguments[0].focus(); arguments[0].select()", self.find(field))
+        self.command("Input.insertText", text=text)
 
     def click(self, what):
         self.find(what).click()
@@ -148,8 +153,9 @@ class Tab:
 
     def all(self, what):
         """All elements of a CSS selector that a person can see now."""
-        found = self.driver.find_elements(By.CSS_SELECTOR, what)
-        return [element for element in found if element.is_displayed()]
+        return self.script("return [...document.querySelectorAll(arguments[0])].filter("
+                           "element => element.checkVisibility({visibilityProperty: true}) && "
+                           "element.getClientRects().length > 0)", what)
 
     def wait(self, condition, what, seconds=PATIENCE):
         """Waits until a condition holds, and returns what it gave."""

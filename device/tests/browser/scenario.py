@@ -21,6 +21,8 @@ def chromium():
 
 
 class Scenario(DeviceTest):
+    key_by_key = False  # whether name and password are typed so
+
     def setUp(self):
         super().setUp()
         for name in self.sessions():
@@ -54,11 +56,12 @@ class Scenario(DeviceTest):
         self.tab.click("#sign-in")
 
     def enter(self, password=None):
-        """Types name and password at the provider's own page, and agrees to what it asks."""
+        """Enters name and password at the provider's own page, and agrees to what it asks."""
         provider, person = self.device.provider, self.device.person
         name, secret = provider.fields
-        self.tab.type(name, person.account)
-        self.tab.type(secret, person.password if password is None else password)
+        write = self.tab.type if self.key_by_key else self.tab.paste
+        write(name, person.account)
+        write(secret, person.password if password is None else password)
         self.tab.press("ENTER")
         provider.agree(self.tab)
 

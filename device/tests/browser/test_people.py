@@ -13,6 +13,7 @@ PHONE = {"width": 320, "height": 568, "deviceScaleFactor": 2, "mobile": True}
 
 class Road:
     """From the device's page to the provider's, in, back to the origin, out."""
+    key_by_key = True
 
     def road(self, profile):
         self.assertIsNone(self.user_shown())
