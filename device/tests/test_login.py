@@ -14,7 +14,7 @@ import urllib.parse
 
 from device import EXPECTED, LOGIN, STORE, DeviceTest, device, values_of
 from providers.scripted import Script
-from servers import Lighttpd
+from servers import Apache, Busybox, Lighttpd, Nginx
 
 FOREIGN = ("https://evil.example/", "//evil.example/", "/\\evil.example", "javascript:alert(1)",
            "evil", "", "/" + "a" * 300, "/é", "/\"", "/<b>",
@@ -573,6 +573,14 @@ class Launched(DeviceTest):
                 self.assert_signed_in(self.sign_in(), profile)
                 self.browser.post(self.device.login_url + "?action=logout", {})
                 self.assertIsNone(self.user())
+
+    def test_under_the_other_web_servers(self):
+        self.addCleanup(self.setUpClass)
+        for server in (Apache, Nginx, Busybox):
+            with self.subTest(server=server.title or server.__name__):
+                self.device.use(server)
+                self.browser = self.new_browser()
+                self.assert_signed_in(self.sign_in(), "websphere")
 
     def test_identities_and_environment(self):
         """As for the set-id program; and of what the web server has set, only what is read."""
