@@ -345,7 +345,7 @@ const KnownCrash kKnownCrashes[] = {
      "OpenSSL locks a part of its own context that it could not make", true},
     {SIGABRT, ", libcurl.so.4 ?, libcurl.so.4 ?, libcurl.so.4 ?, libcurl.so.4 curl_easy_cleanup",
      "libcurl frees a TLS session twice that it could not remember", false},
-    {SIGPROF, ", libcurl.so.4 curl_multi_perform, libcurl.so.4 curl_easy_perform",
+    {SIGPROF, ", libcurl.so.4 curl_easy_perform",
      "libcurl goes on for ever with a transfer over TLS", false},
 };
 
