@@ -144,7 +144,7 @@ void coverFile(const std::string& path, const std::string& text) {
   static int count = 0;
   const std::string cover = "/usr/qova/cover-" + std::to_string(++count);
   std::ofstream(cover, std::ios::binary) << text;
-  if (mount(cover.c_str(), path.c_str(), nullptr, MS_BIND, nullptr) != 0) fail("cover " + path);
+  if (mount(cover.c_str(), path.c_str(), "", MS_BIND, nullptr) != 0) fail("cover " + path);
 }
 
 void resolveToLoopback(const std::string& host) {
