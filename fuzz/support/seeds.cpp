@@ -101,6 +101,7 @@ void headersAndBodies(Seeds& seeds) {
   add("good-hs256", kHS256, fuzz::kClaims);
   add("good-hs512", R"({"alg":"HS512"})", fuzz::kClaims);
   add("good-expiry-now", kHS256, aud + "2000000000}");
+  add("good-expiry-beyond-2-to-31", kHS256, aud + "2200000000}");
   add("good-expiry-2-to-63", kHS256, aud + "9223372036854775808}");
   add("good-expiry-as-text", kHS256, aud + R"("2000000001 seconds"})");
   add("good-expiry-real", kHS256, aud + "2000000000.5}");

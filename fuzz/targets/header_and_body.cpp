@@ -44,7 +44,8 @@ void requireSameClaims(Client& client, const std::string& body) {
   Json::Value claims;
   client.GetUserInfo(info);
   if (fuzz::readJson(fuzz::cString(body), claims)) {
-    fuzz::require(info == claims, "other claims");
+    // By their text: the two readers differ in whether a number is signed.
+    fuzz::require(info.toStyledString() == claims.toStyledString(), "other claims");
   }
 }
 
