@@ -1,0 +1,428 @@
+// Many whole logins against a provider on loopback, and what they leave behind in the process.
+//
+//   endurance azure|websphere LOGINS [tls] [name]    in one process
+//   endurance azure|websphere LOGINS processes       each in a process of its own
+//   endurance azure|websphere LOGINS leak|open|thread  must fail: shows that the check sees it
+//
+// The client runs as a login program does: as a user, with root as the saved identity. Another
+// process looks at it from outside. With "name" the provider is known by a host name that libcurl
+// looks up, otherwise by its address. Prints what it measured; exit status 1 if anything grew, was
+// left over, or went wrong. Needs a sandbox (scripts/check-endurance).
+#include <arpa/inet.h>
+#include <dirent.h>
+#include <dlfcn.h>
+#include <grp.h>
+#include <netinet/in.h>
+#include <openssl/ssl.h>
+#include <pthread.h>
+#include <sys/prctl.h>
+#include <sys/resource.h>
+#include <sys/socket.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <atomic>
+#include <csignal>
+#include <cstdio>
+#include <cstring>
+#include <fstream>
+#include <iostream>
+#include <memory>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include "sso/azuresso.h"
+#include "sso/sso.h"
+#include "sso/webspheresso.h"
+#include "support/ca.h"
+#include "support/device.h"
+#include "support/tokens.h"
+
+namespace {
+
+constexpr char kClientID[] = "device-17";
+constexpr char kSecret[] = "the secret of device-17";
+constexpr char kHost[] = "provider.example";
+constexpr int kSamples = 40;
+constexpr long kWarmUpSamples = 10;
+// What the allocator may still move between two looks; a leak of a byte in each login is more.
+constexpr long kToleratedGrowthKb = 64;
+
+std::atomic<long> threadsStarted{0};
+
+void require(bool good, const std::string& what) {
+  if (!good) throw std::runtime_error(what);
+}
+
+// The provider: fixed answers by path, one connection at a time, in a process of its own.
+class Server {
+ public:
+  Server(bool tls, const test::Ca& authority) : listener(socket(AF_INET, SOCK_STREAM, 0)) {
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    socklen_t size = sizeof address;
+    require(bind(listener, reinterpret_cast<sockaddr*>(&address), size) == 0 &&
+                listen(listener, 64) == 0 &&
+                getsockname(listener, reinterpret_cast<sockaddr*>(&address), &size) == 0,
+            "cannot listen");
+    number = ntohs(address.sin_port);
+    if (tls) context = newContext(authority.issue({kHost, "localhost"}));
+  }
+
+  std::string url(const std::string& host, const std::string& path) const {
+    return std::string(context == nullptr ? "http://" : "https://") + host + ":" +
+           std::to_string(number) + path;
+  }
+
+  pid_t start(const std::vector<std::pair<std::string, std::string>>& script) {
+    for (const auto& [path, body] : script) {
+      answers.emplace_back(" " + path + " ", "HTTP/1.1 200 OK\r\nContent-Length: " +
+                                                 std::to_string(body.size()) + "\r\n\r\n" + body);
+    }
+    const pid_t child = fork();
+    if (child != 0) return child;
+    prctl(PR_SET_PDEATHSIG, SIGKILL);
+    signal(SIGPIPE, SIG_IGN);
+    for (;;) serve(accept(listener, nullptr, nullptr));
+  }
+
+ private:
+  static SSL_CTX* newContext(const test::Identity& identity) {
+    SSL_CTX* const made = SSL_CTX_new(TLS_server_method());
+    BIO* const certificate = BIO_new_mem_buf(identity.certificate.data(), -1);
+    BIO* const key = BIO_new_mem_buf(identity.key.data(), -1);
+    X509* const x = PEM_read_bio_X509(certificate, nullptr, nullptr, nullptr);
+    EVP_PKEY* const k = PEM_read_bio_PrivateKey(key, nullptr, nullptr, nullptr);
+    require(SSL_CTX_use_certificate(made, x) == 1 && SSL_CTX_use_PrivateKey(made, k) == 1,
+            "unusable certificate");
+    return made;  // the process's, as long as it runs
+  }
+
+  void serve(int connection) const {
+    SSL* ssl = nullptr;
+    if (context != nullptr) {
+      ssl = SSL_new(context);
+      SSL_set_fd(ssl, connection);
+      if (SSL_accept(ssl) == 1) answer(connection, ssl);
+      SSL_free(ssl);
+    } else {
+      answer(connection, nullptr);
+    }
+    close(connection);
+  }
+
+  // Answers, and waits for the other side to close.
+  void answer(int connection, SSL* ssl) const {
+    std::string request;
+    char piece[8192];
+    for (bool answered = false;;) {
+      const auto count = ssl != nullptr ? SSL_read(ssl, piece, sizeof piece)
+                                        : static_cast<int>(read(connection, piece, sizeof piece));
+      if (count <= 0) return;
+      if (answered) continue;
+      request.append(piece, static_cast<std::size_t>(count));
+      if (!isWhole(request)) continue;
+      answered = true;
+      const std::string& text = answerTo(request);
+      const auto size = static_cast<int>(text.size());
+      const auto sent = ssl != nullptr
+                            ? SSL_write(ssl, text.data(), size)
+                            : static_cast<int>(write(connection, text.data(), text.size()));
+      if (sent != size) return;
+    }
+  }
+
+  static bool isWhole(const std::string& request) {
+    const std::size_t end = request.find("\r\n\r\n");
+    if (end == std::string::npos) return false;
+    const std::size_t length = request.find("Content-Length: ");
+    if (length == std::string::npos || length > end) return true;
+    return request.size() >= end + 4 + std::stoul(request.substr(length + 16));
+  }
+
+  const std::string& answerTo(const std::string& request) const {
+    static const std::string none = "HTTP/1.1 404 Not Found\r\nContent-Length: 0\r\n\r\n";
+    for (const auto& [path, text] : answers) {
+      if (request.compare(request.find(' '), path.size(), path) == 0) return text;
+    }
+    return none;
+  }
+
+  int listener;
+  int number = 0;
+  SSL_CTX* context = nullptr;
+  std::vector<std::pair<std::string, std::string>> answers;
+};
+
+// The device's files, and the answers that make a login of this client succeed.
+std::vector<std::pair<std::string, std::string>> setUp(const std::string& client,
+                                                       const Server& server,
+                                                       const std::string& host) {
+  const std::string exp = R"("exp":4102444800,"aud":")" + std::string(kClientID) + "\"";
+  const std::string common =
+      "\"" + client + "_client_id\":\"" + kClientID + "\",\"" + client + "_client_secret\":\"" +
+      kSecret + "\",\"" + client + "_redirect_uri\":\"https://device.example/login\",\"" + client +
+      "_authorization_endpoint\":\"" + server.url(host, "/authorize") + "\",\"" + client +
+      "_token_endpoint\":\"" + server.url(host, "/token") + "\"";
+  test::writeConfig("profile.conf", R"({"sso_enable":true,"sso_profile":")" + client + "\"}", 0644);
+  if (client == "websphere") {
+    test::writeConfig("websphere.conf", "{" + common + "}");
+    const std::string token =
+        test::hmacToken(kSecret, R"({"alg":"HS256"})", "{\"sub\":\"alice\"," + exp + "}");
+    return {{"/token", R"({"id_token":")" + token + "\"}"}};
+  }
+  test::writeConfig("azure.conf",
+                    "{" + common + R"(,"azure_sso_enable":true,"azure_tenant_id":"t",)" +
+                        "\"azure_logout_endpoint\":\"" + server.url(host, "/logout") +
+                        "\",\"azure_wellknown\":\"" + server.url(host, "/discovery") + "\"}");
+  const test::RsaKey& key = test::anyRsaKey();
+  const std::string token =
+      test::rsaToken(key, R"({"alg":"RS256","kid":"key-1"})",
+                     R"({"unique_name":"alice@corp.example","tid":"t",)" + exp + "}");
+  return {{"/token", R"({"id_token":")" + token + "\"}"},
+          {"/discovery", R"({"jwks_uri":")" + server.url(host, "/keys") + "\"}"},
+          {"/keys", R"({"keys":[)" + key.jwk("key-1") + "]}"}};
+}
+
+// All that a login program asks of the library for one user, from the redirect to the logout.
+template <typename Client>
+void loginWith(const std::string& expected) {
+  Json::Value parameters;
+  parameters["origin"] = "https://device.example/desktop";
+  const std::string url = Client().GetAccessTokenReqURI(parameters);
+  std::string state = url.substr(url.find("&state=") + 7);
+  for (std::size_t at; (at = state.find("%3D")) != std::string::npos;) state.replace(at, 3, "=");
+  for (std::size_t at; (at = state.find("%2B")) != std::string::npos;) state.replace(at, 3, "+");
+  for (std::size_t at; (at = state.find("%2F")) != std::string::npos;) state.replace(at, 3, "/");
+
+  std::string user;
+  QOVA::SSO::OIDCLogin("the code", user);
+  require(user == expected, "another user: " + user);
+  require(QOVA::SSO::GetSSORelayURL(true, state, "") ==
+              "ssoclient/relay.html#origin=https%3A%2F%2Fdevice.example%2Fdesktop&success=true",
+          "another relay URL");
+  require(!QOVA::SSO::GetSSORelayURL(false, state, "why").empty(), "no relay URL");
+  (void)QOVA::SSO::GetAzureSSOLogoutURL("https://device.example/index.cgi");
+}
+
+void login(const std::string& client) {
+  if (client == "azure") {
+    loginWith<QOVA::SSO::AzureSSOClient>("CORP.EXAMPLE\\alice");
+  } else {
+    loginWith<QOVA::SSO::WebSphereSSOClient>("alice");
+  }
+}
+
+// As the login program runs: a user's effective ids, root's saved.
+void becomeLoginProgram() {
+  require(
+      setgroups(0, nullptr) == 0 && setresgid(1000, 1000, 0) == 0 && setresuid(1000, 1000, 0) == 0,
+      "cannot change ids");
+}
+
+int entries(const std::string& folder) {
+  int count = 0;
+  DIR* const open = opendir(folder.c_str());
+  require(open != nullptr, "cannot look into " + folder);
+  while (const dirent* entry = readdir(open)) count += entry->d_name[0] != '.';
+  closedir(open);
+  return count;
+}
+
+// What the client process holds, seen from outside.
+struct Sample {
+  long logins;
+  long rssKb;
+  int descriptors;
+  int tasks;
+  int children;
+  long threads;
+};
+
+Sample look(pid_t client, long logins, long threads) {
+  const std::string folder = "/proc/" + std::to_string(client) + "/";
+  Sample sample{logins, 0, entries(folder + "fd"), entries(folder + "task"), 0, threads};
+  std::ifstream status(folder + "status");
+  for (std::string line; std::getline(status, line);) {
+    if (line.rfind("VmRSS:", 0) == 0) sample.rssKb = std::stol(line.substr(6));
+  }
+  std::ifstream children(folder + "task/" + std::to_string(client) + "/children");
+  for (pid_t child; children >> child;) ++sample.children;
+  return sample;
+}
+
+long median(std::vector<Sample>::const_iterator begin, std::vector<Sample>::const_iterator end) {
+  std::vector<long> values;
+  for (; begin != end; ++begin) values.push_back(begin->rssKb);
+  std::sort(values.begin(), values.end());
+  return values[values.size() / 2];
+}
+
+// The windows after the warm-up: none may hold more than the first.
+bool isFlat(const std::vector<Sample>& samples, bool byName) {
+  const auto late = samples.begin() + kWarmUpSamples;
+  const auto half = late + (samples.end() - late) / 2;
+  const long before = median(late, half);
+  const long after = median(half, samples.end());
+  bool good = after - before <= kToleratedGrowthKb;
+  std::printf("  memory: %ld KB in the earlier window, %ld KB in the later\n", before, after);
+  for (const Sample& sample : samples) {
+    good = good && sample.descriptors == samples.front().descriptors && sample.tasks == 1 &&
+           sample.children == 0 && (byName || sample.threads == 0);
+  }
+  std::printf(
+      "  descriptors: %d; threads in the process: %d; started so far: %ld%s; children: %d\n",
+      samples.back().descriptors, samples.back().tasks, samples.back().threads,
+      byName ? " (libcurl's look-up of the name)" : "", samples.back().children);
+  return good;
+}
+
+// What a login must not leave behind.
+void leave(const std::string& defect) {
+  static std::vector<std::unique_ptr<std::string>> leaked;
+  if (defect == "leak") leaked.push_back(std::make_unique<std::string>(512, 'x'));
+  if (defect == "open") require(dup(0) >= 0, "dup");
+  pthread_t thread{};
+  const auto nothing = [](void*) -> void* { return nullptr; };
+  if (defect == "thread") pthread_create(&thread, nullptr, nothing, nullptr);
+}
+
+struct Report {
+  long logins;
+  long threads;
+};
+
+// The client's side: logs in, reports, and waits to be looked at.
+[[noreturn]] void logInAndReport(const std::string& client, long logins, const std::string& defect,
+                                 int out, int in) {
+  prctl(PR_SET_PDEATHSIG, SIGKILL);
+  int status = 0;
+  try {
+    becomeLoginProgram();
+    for (long done = 1; done <= logins; ++done) {
+      login(client);
+      if (!defect.empty()) leave(defect);
+      if (done % (logins / kSamples) != 0) continue;
+      const Report report{done, threadsStarted};
+      char seen = 0;
+      require(write(out, &report, sizeof report) == sizeof report && read(in, &seen, 1) == 1,
+              "the other side is gone");
+    }
+  } catch (const std::exception& e) {
+    std::fprintf(stderr, "endurance: %s\n", e.what());
+    status = 1;
+  }
+  _exit(status);
+}
+
+bool inOneProcess(const std::string& client, long logins, const std::string& defect, bool byName) {
+  int reports[2];
+  int answers[2];
+  require(pipe(reports) == 0 && pipe(answers) == 0, "no pipe");
+  std::fflush(stdout);
+  const pid_t child = fork();
+  if (child == 0) logInAndReport(client, logins, defect, reports[1], answers[0]);
+  close(reports[1]);
+  close(answers[0]);
+
+  std::vector<Sample> samples;
+  for (Report report{}; read(reports[0], &report, sizeof report) == sizeof report;) {
+    samples.push_back(look(child, report.logins, report.threads));
+    require(write(answers[1], "", 1) == 1, "the client is gone");
+  }
+  int status = 0;
+  require(waitpid(child, &status, 0) == child, "no client");
+  if (status != 0 || samples.size() != kSamples) {
+    std::printf("  ended with status %d after %zu of %d looks\n", status, samples.size(), kSamples);
+    return false;
+  }
+  return isFlat(samples, byName);
+}
+
+// Each login in a process of its own, four at a time.
+bool inManyProcesses(const std::string& client, long logins) {
+  std::vector<long> sizes;
+  long failed = 0;
+  long running = 0;
+  for (long started = 0; started < logins || running > 0;) {
+    if (started < logins && running < 4) {
+      ++started;
+      ++running;
+      if (fork() != 0) continue;
+      int status = 0;
+      try {
+        becomeLoginProgram();
+        login(client);
+        status = threadsStarted == 0 ? 0 : 2;
+      } catch (const std::exception& e) {
+        std::fprintf(stderr, "endurance: %s\n", e.what());
+        status = 1;
+      }
+      _exit(status);
+    }
+    rusage usage{};
+    int status = 0;
+    if (wait4(-1, &status, 0, &usage) <= 0) break;
+    --running;
+    failed += status != 0;
+    sizes.push_back(usage.ru_maxrss);
+  }
+  const auto [least, most] = std::minmax_element(sizes.begin(), sizes.end());
+  std::printf("  %zu processes, %ld failed; %ld to %ld KB each\n", sizes.size(), failed, *least,
+              *most);
+  return failed == 0 && static_cast<long>(sizes.size()) == logins;
+}
+
+int run(const std::vector<std::string>& arguments) {
+  const auto has = [&](const char* word) {
+    return std::find(arguments.begin(), arguments.end(), word) != arguments.end();
+  };
+  require(arguments.size() >= 2 && (has("azure") || has("websphere")),
+          "usage: endurance azure|websphere LOGINS [tls] [name] | [processes]");
+  const std::string& client = arguments[0];
+  const long logins = std::stol(arguments[1]);
+  test::requireSandbox();
+
+  const test::Ca authority;
+  if (has("tls")) authority.trust();
+  if (has("name")) test::resolveToLoopback(kHost);
+  Server server(has("tls"), authority);
+  const std::string host = has("name") ? kHost : has("tls") ? "localhost" : "127.0.0.1";
+  const pid_t provider = server.start(setUp(client, server, host));
+  std::printf("%s, %ld logins%s\n", client.c_str(), logins,
+              has("processes") ? " in processes" : "");
+  std::string defect;
+  for (const char* const word : {"leak", "open", "thread"}) {
+    if (has(word)) defect = word;
+  }
+  const bool good = has("processes") ? inManyProcesses(client, logins)
+                                     : inOneProcess(client, logins, defect, has("name"));
+  kill(provider, SIGKILL);
+  int status = 0;
+  require(waitpid(provider, &status, 0) == provider, "no provider");
+  require(waitpid(-1, &status, WNOHANG) == -1, "a process was left behind");
+  return good ? 0 : 1;
+}
+
+}  // namespace
+
+// Counts the threads that anyone in this process starts.
+extern "C" int pthread_create(pthread_t* thread, const pthread_attr_t* attributes,
+                              void* (*start)(void*), void* argument) {
+  using Create = int(pthread_t*, const pthread_attr_t*, void* (*)(void*), void*);
+  static auto* const next = reinterpret_cast<Create*>(dlsym(RTLD_NEXT, "pthread_create"));
+  ++threadsStarted;
+  return next(thread, attributes, start, argument);
+}
+
+int main(int argc, char** argv) {
+  try {
+    return run({argv + 1, argv + argc});
+  } catch (const std::exception& e) {
+    std::fprintf(stderr, "endurance: %s\n", e.what());
+    return 1;
+  }
+}
