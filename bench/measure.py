@@ -20,11 +20,6 @@ class Programs:
         return [name for name in ("libjwt", "cjose", "rhonabwy")
                 if os.path.exists(self.path("peer_" + name))]
 
-    def operations(self, program):
-        listed = subprocess.run([self.path(program), "list"], check=True, stdout=subprocess.PIPE,
-                                text=True)
-        return set(listed.stdout.split())
-
     def nanoseconds(self, program, operation, times):
         output = subprocess.run(
             [self.path(program), self.material, "time", "%s:%d" % (operation, times)],

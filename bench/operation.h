@@ -68,13 +68,8 @@ inline void count(const std::string& name, const Operation& operation, long time
   CALLGRIND_DUMP_STATS_AT(name.c_str());
 }
 
-// PROGRAM FOLDER time|count OPERATION:TIMES...; "time" prints the nanoseconds for each, "list"
-// what there is.
+// PROGRAM FOLDER time|count OPERATION:TIMES...; "time" prints the nanoseconds for each.
 inline int run(int arguments_count, char** arguments, const Makers& makers) try {
-  if (arguments_count == 2 && std::strcmp(arguments[1], "list") == 0) {
-    for (const auto& maker : makers) std::printf("%s\n", maker.first.c_str());
-    return EXIT_SUCCESS;
-  }
   require(arguments_count >= 4, "arguments: FOLDER time|count OPERATION:TIMES...");
   const Material material(arguments[1]);
   const bool counting = std::strcmp(arguments[2], "count") == 0;
