@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 #include <openssl/evp.h>
 
+#include <cctype>
 #include <string>
 #include <vector>
 
@@ -358,9 +359,12 @@ TEST_F(JwtHmac, RefusesOtherSpellingsOfTheRightSignature) {
   slash[slash.find('_')] = '/';
   std::string unused_bits = kHmacSignature;
   unused_bits.back() = 'l';  // "k" and "l" differ in a bit that stands for nothing
+  std::string other_case = kHmacSignature;
+  for (char& c : other_case)
+    c = static_cast<char>(std::islower(c) ? std::toupper(c) : std::tolower(c));
   for (const std::string& signature :
-       {kHmacSignature + "=", kHmacSignature + "==", plus, slash, unused_bits, kHmacSignature + "A",
-        kHmacSignature.substr(0, 42), kHmacSignature + " ", std::string()}) {
+       {other_case, kHmacSignature + "=", kHmacSignature + "==", plus, slash, unused_bits,
+        kHmacSignature + "A", kHmacSignature.substr(0, 42), kHmacSignature + " ", std::string()}) {
     SCOPED_TRACE(signature);
     ExpectHmacRefused(kHmacHeader + "." + kPayload + "." + signature, kHmacKey);
   }
