@@ -23,9 +23,8 @@
 #include <ctime>
 #include <string>
 
-#include "operation.h"
 #include "platform/platform.h"
-#include "sizes.h"
+#include "work.h"
 
 #pragma GCC diagnostic ignored \
     "-Wdeprecated-declarations"  // the reader and writer that are asked for
@@ -103,7 +102,7 @@ bool verifyRsa(const Token& token, const char* n, size_t n_size, const char* e, 
   return good;
 }
 
-auto rsa(const std::string& name, const EVP_MD* (*digest)()) {
+auto rsa(const std::string& name, bench::Digest digest) {
   return [=](const Material& material) -> Operation {
     return [text = material[name], n = material["n"], e = material["e"], digest] {
       const std::string copy = text;
@@ -140,17 +139,9 @@ bool verifyHmac(const Token& token, const std::string& key_text, const EVP_MD* m
   return good;
 }
 
-std::string encodedSecret(const Material& material) {
-  const std::string secret = material["secret"];
-  unsigned char text[1024];
-  const int length = EVP_EncodeBlock(text, reinterpret_cast<const unsigned char*>(secret.data()),
-                                     static_cast<int>(secret.size()));
-  return {reinterpret_cast<char*>(text), static_cast<size_t>(length)};
-}
-
-auto hmac(const std::string& name, const EVP_MD* (*digest)()) {
+auto hmac(const std::string& name, bench::Digest digest) {
   return [=](const Material& material) -> Operation {
-    return [text = material[name], key = encodedSecret(material), digest] {
+    return [text = material[name], key = bench::encodedSecret(material), digest] {
       const std::string copy = text;
       bench::require(verifyHmac(Token(copy), key, digest()), "HMAC");
     };
@@ -184,7 +175,7 @@ auto parse(const std::string& name) {
 }
 
 // From the token to its claims, signature checked.
-auto check(const std::string& name, const EVP_MD* (*digest)()) {
+auto check(const std::string& name, bench::Digest digest) {
   return [=](const Material& material) -> Operation {
     return [text = material[name], n = material["n"], e = material["e"], digest] {
       const std::string copy = text;
@@ -198,9 +189,9 @@ auto check(const std::string& name, const EVP_MD* (*digest)()) {
   };
 }
 
-auto checkHmac(const std::string& name, const EVP_MD* (*digest)()) {
+auto checkHmac(const std::string& name, bench::Digest digest) {
   return [=](const Material& material) -> Operation {
-    return [text = material[name], key = encodedSecret(material), digest] {
+    return [text = material[name], key = bench::encodedSecret(material), digest] {
       const std::string copy = text;
       const Token token(copy);
       const Json::Value header = parseSegment(token.begin, token.body - 1);
@@ -393,34 +384,10 @@ auto parseKeys(const std::string& keys) {
 }  // namespace
 
 int main(int count, char** arguments) {
-  bench::Makers makers = {{"rs256", rsa("rs256", EVP_sha256)},
-                          {"rs384", rsa("rs384", EVP_sha384)},
-                          {"rs512", rsa("rs512", EVP_sha512)},
-                          {"hs256", hmac("hs256", EVP_sha256)},
-                          {"hs384", hmac("hs384", EVP_sha384)},
-                          {"hs512", hmac("hs512", EVP_sha512)},
-                          {"check-rs256", check("rs256", EVP_sha256)},
-                          {"check-rs384", check("rs384", EVP_sha384)},
-                          {"check-rs512", check("rs512", EVP_sha512)},
-                          {"check-hs256", checkHmac("hs256", EVP_sha256)},
-                          {"check-hs384", checkHmac("hs384", EVP_sha384)},
-                          {"check-hs512", checkHmac("hs512", EVP_sha512)},
-                          {"parse", parse("rs256")},
-                          {"url", url},
-                          {"urlencode", urlEncode},
-                          {"md5", md5}};
+  bench::Makers makers =
+      bench::makersOf({rsa, hmac, check, checkHmac, parse, loginWith, answer, url, urlEncode, md5});
   for (const int keys : bench::kKeyCounts) {
-    makers["login-keys-" + std::to_string(keys)] = loginWith(std::to_string(keys));
     makers["parse-keys-" + std::to_string(keys)] = parseKeys(std::to_string(keys));
-  }
-  for (const size_t size : bench::kTokenSizes) {
-    const std::string name = "rs256-" + std::to_string(size);
-    makers[name] = rsa(name, EVP_sha256);
-    makers["check-" + name] = check(name, EVP_sha256);
-  }
-  for (const size_t size : bench::kAnswerSizes) {
-    const std::string name = "answer-" + std::to_string(size);
-    makers[name] = answer(name);
   }
   return bench::run(count, arguments, makers);
 }

@@ -1,14 +1,11 @@
 // The work done by the library.
-#include <openssl/evp.h>
-
 #include <string>
 #include <utility>
 
-#include "operation.h"
-#include "sizes.h"
 #include "sso/azuresso.h"
 #include "sso/jwt.h"
 #include "sso/utils.h"
+#include "work.h"
 
 namespace {
 
@@ -17,7 +14,7 @@ using bench::Operation;
 using QOVA::JWT::Jwt;
 using QOVA::SSO::AzureSSOClient;
 
-auto rsa(const std::string& name, const EVP_MD* (*digest)()) {
+auto rsa(const std::string& name, bench::Digest digest) {
   return [=](const Material& material) -> Operation {
     return [token = material[name], n = material["n"], e = material["e"], digest]() mutable {
       std::string copy = token;
@@ -27,17 +24,9 @@ auto rsa(const std::string& name, const EVP_MD* (*digest)()) {
   };
 }
 
-std::string encodedSecret(const Material& material) {
-  const std::string secret = material["secret"];
-  unsigned char text[1024];
-  const int length = EVP_EncodeBlock(text, reinterpret_cast<const unsigned char*>(secret.data()),
-                                     static_cast<int>(secret.size()));
-  return {reinterpret_cast<char*>(text), static_cast<size_t>(length)};
-}
-
-auto hmac(const std::string& name, const EVP_MD* (*digest)()) {
+auto hmac(const std::string& name, bench::Digest digest) {
   return [=](const Material& material) -> Operation {
-    return [token = material[name], key = encodedSecret(material), digest]() mutable {
+    return [token = material[name], key = bench::encodedSecret(material), digest]() mutable {
       std::string copy = token;
       Jwt jwt(std::move(copy));
       jwt.JwtHMACVerify(key, digest());
@@ -46,7 +35,7 @@ auto hmac(const std::string& name, const EVP_MD* (*digest)()) {
 }
 
 // From the token to its claims, signature checked: what other libraries do in one call.
-auto check(const std::string& name, const EVP_MD* (*digest)()) {
+auto check(const std::string& name, bench::Digest digest) {
   return [=](const Material& material) -> Operation {
     return [token = material[name], n = material["n"], e = material["e"], digest]() mutable {
       std::string copy = token;
@@ -57,9 +46,9 @@ auto check(const std::string& name, const EVP_MD* (*digest)()) {
   };
 }
 
-auto checkHmac(const std::string& name, const EVP_MD* (*digest)()) {
+auto checkHmac(const std::string& name, bench::Digest digest) {
   return [=](const Material& material) -> Operation {
-    return [token = material[name], key = encodedSecret(material), digest]() mutable {
+    return [token = material[name], key = bench::encodedSecret(material), digest]() mutable {
       std::string copy = token;
       Jwt jwt(std::move(copy));
       bench::require(jwt.GetHeader().isObject() && jwt.GetBody().isObject(), "parse");
@@ -135,33 +124,7 @@ auto login(const std::string& keys) {
 }  // namespace
 
 int main(int count, char** arguments) {
-  bench::Makers makers = {{"rs256", rsa("rs256", EVP_sha256)},
-                          {"rs384", rsa("rs384", EVP_sha384)},
-                          {"rs512", rsa("rs512", EVP_sha512)},
-                          {"hs256", hmac("hs256", EVP_sha256)},
-                          {"hs384", hmac("hs384", EVP_sha384)},
-                          {"hs512", hmac("hs512", EVP_sha512)},
-                          {"check-rs256", check("rs256", EVP_sha256)},
-                          {"check-rs384", check("rs384", EVP_sha384)},
-                          {"check-rs512", check("rs512", EVP_sha512)},
-                          {"check-hs256", checkHmac("hs256", EVP_sha256)},
-                          {"check-hs384", checkHmac("hs384", EVP_sha384)},
-                          {"check-hs512", checkHmac("hs512", EVP_sha512)},
-                          {"parse", parse("rs256")},
-                          {"url", url},
-                          {"urlencode", urlEncode},
-                          {"md5", md5}};
-  for (const int keys : bench::kKeyCounts) {
-    makers["login-keys-" + std::to_string(keys)] = login(std::to_string(keys));
-  }
-  for (const size_t size : bench::kTokenSizes) {
-    const std::string name = "rs256-" + std::to_string(size);
-    makers[name] = rsa(name, EVP_sha256);
-    makers["check-" + name] = check(name, EVP_sha256);
-  }
-  for (const size_t size : bench::kAnswerSizes) {
-    const std::string name = "answer-" + std::to_string(size);
-    makers[name] = answer(name);
-  }
-  return bench::run(count, arguments, makers);
+  return bench::run(
+      count, arguments,
+      bench::makersOf({rsa, hmac, check, checkHmac, parse, login, answer, url, urlEncode, md5}));
 }

@@ -13,7 +13,7 @@
 #include <stdexcept>
 #include <string>
 
-#include "sizes.h"
+#include "work.h"
 
 namespace {
 

@@ -36,10 +36,14 @@ class Programs:
                  statistics.median(row[i] / row[0] for row in taken))
                 for i in range(len(programs))]
 
-    def instructions(self, program, operations, times=2):
+    def first_instructions(self, program, operation):
+        """Instructions for an operation that is the first of its process."""
+        return self.instructions(program, [operation], 1, "first")[operation]
+
+    def instructions(self, program, operations, times=2, way="count"):
         """Instructions for one of each operation."""
         with tempfile.TemporaryDirectory() as folder:
-            callgrind([self.path(program), self.material, "count"] +
+            callgrind([self.path(program), self.material, way] +
                       ["%s:%d" % (operation, times) for operation in operations],
                       folder + "/out")
             counts = {}

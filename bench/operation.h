@@ -5,7 +5,6 @@
 
 #include <cstdio>
 #include <cstdlib>
-#include <cstring>
 #include <ctime>
 #include <fstream>
 #include <functional>
@@ -42,7 +41,8 @@ inline void require(bool good, const char* what) {
 
 // Makes an operation ready; what it returns is the operation.
 using Operation = std::function<void()>;
-using Makers = std::map<std::string, std::function<Operation(const Material&)>>;
+using Maker = std::function<Operation(const Material&)>;
+using Makers = std::map<std::string, Maker>;
 
 // The time that this process has had the processor for, in nanoseconds: other programs do not
 // count.
@@ -60,19 +60,20 @@ inline double time(const Operation& operation, long times) {
   return (processorTime() - begin) / static_cast<double>(times);
 }
 
-// Leaves the instructions of `times` operations in callgrind's output, under the operation's name.
-inline void count(const std::string& name, const Operation& operation, long times) {
-  operation();  // whatever happens once only
+// Leaves the instructions of `times` operations in callgrind's output, under the operation's name;
+// or, of a `first` one, with all that happens once only, as in a login program's process.
+inline void count(const std::string& name, const Operation& operation, long times, bool first) {
+  if (!first) operation();
   CALLGRIND_ZERO_STATS;
   for (long i = 0; i < times; ++i) operation();
   CALLGRIND_DUMP_STATS_AT(name.c_str());
 }
 
-// PROGRAM FOLDER time|count OPERATION:TIMES...; "time" prints the nanoseconds for each.
+// PROGRAM FOLDER time|count|first OPERATION:TIMES...; "time" prints the nanoseconds for each.
 inline int run(int arguments_count, char** arguments, const Makers& makers) try {
-  require(arguments_count >= 4, "arguments: FOLDER time|count OPERATION:TIMES...");
+  require(arguments_count >= 4, "arguments: FOLDER time|count|first OPERATION:TIMES...");
   const Material material(arguments[1]);
-  const bool counting = std::strcmp(arguments[2], "count") == 0;
+  const std::string way = arguments[2];
   for (int i = 3; i < arguments_count; ++i) {
     const std::string wanted = arguments[i];
     const size_t colon = wanted.find(':');
@@ -82,10 +83,10 @@ inline int run(int arguments_count, char** arguments, const Makers& makers) try 
     const auto maker = makers.find(name);
     require(maker != makers.end(), "no such operation");
     const Operation operation = maker->second(material);
-    if (counting) {
-      count(name, operation, times);
-    } else {
+    if (way == "time") {
       std::printf("%.1f\n", time(operation, times));
+    } else {
+      count(name, operation, times, way == "first");
     }
   }
   return EXIT_SUCCESS;
