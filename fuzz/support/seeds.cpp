@@ -106,6 +106,7 @@ void headersAndBodies(Seeds& seeds) {
   add("good-expiry-as-text", kHS256, aud + R"("2000000001 seconds"})");
   add("good-expiry-real", kHS256, aud + "2000000000.5}");
   add("good-comment", kHS256 + "// why not", aud + "/*soon*/2000000001}");
+  add("good-comment-of-two-lines", kHS256, aud + "/*not\r\n\"now*/2000000001}");
   add("good-later-member-counts", R"({"alg":"none","alg":"HS256"})", aud + "1,\"exp\":2000000001}");
   add("good-zero-byte-behind-json", kHS256 + std::string(1, '\0') + "}",
       fuzz::kClaims + std::string(1, '\0') + "}");
@@ -329,6 +330,7 @@ void states(Seeds& seeds) {
   parameters("good-nested", R"({"a":[1,2.5,true,null,{"b":"c"}],"origin":{"x":1}})");
   parameters("good-utf8", "{\"origin\":\"/\xc3\xa4\xe2\x82\xac\xf0\x9f\x98\x80\"}");
   parameters("good-invalid-utf8", "{\"origin\":\"/\xff\xc0\x80\"}");
+  parameters("good-names-that-become-one", "{\"\xff\":1,\"\xfe\":1,\"origin\":\"/\"}");
   parameters("good-line-breaks", R"({"origin":"/\r\nLocation: x"})");
   // What the library adds around it: the nonce, 43 bytes, and a line feed.
   const auto sized = [](std::size_t size) {

@@ -33,8 +33,8 @@ void requireQuery(const std::string& url, const Json::Value& parameters) {
 
   Json::Value expected = parameters.isObject() ? parameters : Json::Value(Json::objectValue);
   expected["nonce"] = fuzz::md5Hex(valueOf(query, "nonce"));
-  // As texts: what is not UTF-8 does not survive being written.
-  fuzz::require(WriteJson(state) == WriteJson(expected), "another state");
+  // As texts: what is not UTF-8 does not survive being written, and names may become one.
+  fuzz::require(*bytes == WriteJson(expected), "another state");
 
   // And back, as the relay page gets it.
   const std::string relay = GetSSORelayURL(true, valueOf(query, "state"), "");
