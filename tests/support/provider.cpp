@@ -182,7 +182,8 @@ std::string bytesOf(const Answer& answer) {
 void sendAnswer(Connection& connection, const Answer& answer) {
   if (answer.delayMs > 0) usleep(static_cast<useconds_t>(answer.delayMs) * 1000);
   const std::string text = bytesOf(answer).substr(0, answer.cut);
-  const std::size_t piece = answer.piece == 0 ? text.size() : answer.piece;
+  // Chunks go out at once: one that is cut on its way would arrive as two.
+  const std::size_t piece = answer.piece == 0 || answer.chunked ? text.size() : answer.piece;
   for (std::size_t at = 0; at < text.size(); at += piece) {
     if (!connection.send(text.data() + at, std::min(piece, text.size() - at))) return;
   }

@@ -29,7 +29,7 @@ struct Answer {
   std::vector<std::string> headers;     // whole lines, "Name: value"
   std::string raw;                      // if not empty: sent instead of all that is above
   bool chunked = false;                 // Transfer-Encoding, one chunk per piece
-  std::size_t piece = 0;                // bytes per write to the socket; 0: all at once
+  std::size_t piece = 0;                // bytes per chunk or write to the socket; 0: all at once
   long long contentLength = -1;         // what Content-Length claims; -1: the truth
   std::size_t cut = std::string::npos;  // the connection ends after so many bytes
   int delayMs = 0;                      // silence before the first byte
