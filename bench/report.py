@@ -56,6 +56,10 @@ class Bars:
         self.at_most("redirect, of a program that does nothing", redirect[0].ratio, 0.50)
         self.at_most("the same, in processor time", redirect[0].processor_ratio, 0.50)
         self.at_most("the same, in instructions", redirect[1] / nothing[1], 0.50)
+        linked = without["library, libcurl linked: redirect"]
+        self.at_most("redirect with libcurl linked in the ordinary way", linked[0].ratio, 1.08)
+        self.at_most("the same, in processor time", linked[0].processor_ratio, 1.08)
+        self.at_most("the same, in instructions", linked[1] / nothing[1], 1.08)
         for what, limit in (("the system's CA bundle", 1.02), ("one CA certificate", 1.06)):
             rows = dict(found.logins[what])
             login = rows["library: login"]

@@ -95,11 +95,13 @@ def measure_peers(programs):
     return rows
 
 
-def programs_without_requests(programs):
-    """Programs that end before their first request, beside one that does nothing."""
+def programs_without_requests(programs, linked):
+    """Programs that end before their first request, beside one that does nothing. `linked` is built
+    with the library that does not load libcurl late."""
     commands = {"nothing, linked with the three libraries": [programs.path("cgi_nothing")]}
     for what in ("redirect", "profile", "logout"):
         commands["library: " + what] = [programs.path("cgi_library"), what]
+    commands["library, libcurl linked: redirect"] = [linked, "redirect"]
     native = len(commands)
     if os.path.exists(programs.path("cgi_iddawc")):
         commands["iddawc: redirect"] = [programs.path("cgi_iddawc"), "redirect"]
@@ -146,7 +148,7 @@ def main(arguments):
     say(started, "the same by other libraries")
     found.peers = measure_peers(programs)
     say(started, "programs that make no request")
-    found.without_requests = programs_without_requests(programs)
+    found.without_requests = programs_without_requests(programs, build + "-linked/bench/cgi_library")
     say(started, "logins over TLS")
     authority = settings.Authority(work)
     provider = settings.Provider(HERE, material, authority)
