@@ -1,5 +1,6 @@
 // The provider clients as their files make them.
 #include <dlfcn.h>
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -57,6 +58,21 @@ TYPED_TEST(ClientConfig, TakesEverySettingFromItsKey) {
   for (const Setting& setting : this->Settings())
     EXPECT_EQ((client.*setting.get)(), setting.key) << setting.key;
   EXPECT_EQ(client.GetToken(), "");
+}
+
+// The number that the next file to be opened gets.
+int nextDescriptor() {
+  const int descriptor = open("/dev/null", O_RDONLY | O_CLOEXEC);
+  close(descriptor);
+  return descriptor;
+}
+
+TYPED_TEST(ClientConfig, LeavesNoFileOpen) {
+  const int before = nextDescriptor();
+  writeConfig(this->File(), "{}");
+  typename TypeParam::Client client;
+  EXPECT_GE(before, 0);
+  EXPECT_EQ(nextDescriptor(), before);
 }
 
 TYPED_TEST(ClientConfig, WithoutAFileIsEmpty) {

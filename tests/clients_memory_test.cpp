@@ -1,5 +1,6 @@
 // The provider clients when memory runs out: each allocation fails once and comes out as
 // std::bad_alloc; what was taken is released (the address check says so).
+#include <curl/curl.h>
 #include <gtest/gtest.h>
 
 #include <string>
@@ -8,6 +9,7 @@
 #include "support/device.h"
 #include "support/log.h"
 #include "support/memory_spy.h"
+#include "support/provider.h"
 #include "support/tokens.h"
 
 namespace {
@@ -66,6 +68,37 @@ TYPED_TEST(ClientMemory, IsNeededForTheIdToken) {
   Json::Value info;
   EXPECT_GE(failEachNew([&] { client.GetUserInfo(info); }), 3);
   EXPECT_EQ(info["exp"].asString(), "4102444800");
+}
+
+// A chunk that there is no memory for ends the transfer, be it a single byte.
+TYPED_TEST(ClientMemory, IsNeededForEachChunkOfAnAnswer) {
+  test::Answer chunks = test::ok("a body longer than a string holds in itself");
+  chunks.chunked = true;
+  chunks.piece = 1;
+  test::Provider provider;
+  provider.answer("/", chunks).start();
+  Json::Value settings;
+  settings["token_endpoint"] = provider.url("/");
+  test::configure<TypeParam>(settings);
+  typename TypeParam::Client client;
+  const std::string line =
+      std::string("request token uri ") + curl_easy_strerror(CURLE_WRITE_ERROR) + ".";
+  int ended = 0;
+  bool failed = true;
+  for (std::size_t nth = 1; nth <= 100 && failed; ++nth) {
+    std::string response;
+    test::failNew(nth);
+    client.RequestTokenEndpoint(response, "a=1");
+    failed = test::newFailed();
+    test::failNew(0);
+    if (response != chunks.body) {
+      EXPECT_EQ(this->log.lines().size(), 1u) << "operator new " << nth << ": " << response;
+      ended += !response.empty() && this->log.is({{LOG_ERR, "sso.cpp", line}});
+    }
+    this->log.clear();
+  }
+  EXPECT_FALSE(failed);
+  EXPECT_GE(ended, 2);
 }
 
 using WebSphereMemory = ClientMemory<test::WebSphere>;
