@@ -8,11 +8,9 @@
 // process looks at it from outside. With "name" the provider is known by a host name that libcurl
 // looks up, otherwise by its address. Prints what it measured; exit status 1 if anything grew, was
 // left over, or went wrong. Needs a sandbox (scripts/check-endurance).
-#include <arpa/inet.h>
 #include <dirent.h>
 #include <dlfcn.h>
 #include <grp.h>
-#include <netinet/in.h>
 #include <openssl/ssl.h>
 #include <pthread.h>
 #include <sys/prctl.h>
@@ -38,6 +36,7 @@
 #include "sso/webspheresso.h"
 #include "support/ca.h"
 #include "support/device.h"
+#include "support/server.h"
 #include "support/tokens.h"
 
 namespace {
@@ -45,6 +44,7 @@ namespace {
 constexpr char kClientID[] = "device-17";
 constexpr char kSecret[] = "the secret of device-17";
 constexpr char kHost[] = "provider.example";
+constexpr unsigned kLongestRun = 24 * 3600;  // seconds
 constexpr int kSamples = 40;
 constexpr long kWarmUpSamples = 10;
 // What the allocator may still move between two looks; a leak of a byte in each login is more.
@@ -57,37 +57,28 @@ void require(bool good, const std::string& what) {
 }
 
 // The provider: fixed answers by path, one connection at a time, in a process of its own.
-class Server {
+class Provider {
  public:
-  Server(bool tls, const test::Ca& authority) : listener(socket(AF_INET, SOCK_STREAM, 0)) {
-    sockaddr_in address{};
-    address.sin_family = AF_INET;
-    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    socklen_t size = sizeof address;
-    require(bind(listener, reinterpret_cast<sockaddr*>(&address), size) == 0 &&
-                listen(listener, 64) == 0 &&
-                getsockname(listener, reinterpret_cast<sockaddr*>(&address), &size) == 0,
-            "cannot listen");
-    number = ntohs(address.sin_port);
+  Provider(bool tls, const test::Ca& authority) {
     if (tls) context = newContext(authority.issue({kHost, "localhost"}));
   }
 
   std::string url(const std::string& host, const std::string& path) const {
     return std::string(context == nullptr ? "http://" : "https://") + host + ":" +
-           std::to_string(number) + path;
+           std::to_string(server.port()) + path;
   }
 
-  pid_t start(const std::vector<std::pair<std::string, std::string>>& script) {
+  void start(const std::vector<std::pair<std::string, std::string>>& script) {
     for (const auto& [path, body] : script) {
       answers.emplace_back(" " + path + " ", "HTTP/1.1 200 OK\r\nContent-Length: " +
                                                  std::to_string(body.size()) + "\r\n\r\n" + body);
     }
-    const pid_t child = fork();
-    if (child != 0) return child;
-    prctl(PR_SET_PDEATHSIG, SIGKILL);
-    signal(SIGPIPE, SIG_IGN);
-    for (;;) serve(accept(listener, nullptr, nullptr));
+    const auto serveAll = [this](int listener) {
+      for (;;) serve(accept(listener, nullptr, nullptr));
+    };
+    server.start(serveAll, kLongestRun);
   }
+  void stop() { server.stop(); }
 
  private:
   static SSL_CTX* newContext(const test::Identity& identity) {
@@ -151,22 +142,21 @@ class Server {
     return none;
   }
 
-  int listener;
-  int number = 0;
+  test::Server server;
   SSL_CTX* context = nullptr;
   std::vector<std::pair<std::string, std::string>> answers;
 };
 
 // The device's files, and the answers that make a login of this client succeed.
 std::vector<std::pair<std::string, std::string>> setUp(const std::string& client,
-                                                       const Server& server,
+                                                       const Provider& provider,
                                                        const std::string& host) {
   const std::string exp = R"("exp":4102444800,"aud":")" + std::string(kClientID) + "\"";
   const std::string common =
       "\"" + client + "_client_id\":\"" + kClientID + "\",\"" + client + "_client_secret\":\"" +
       kSecret + "\",\"" + client + "_redirect_uri\":\"https://device.example/login\",\"" + client +
-      "_authorization_endpoint\":\"" + server.url(host, "/authorize") + "\",\"" + client +
-      "_token_endpoint\":\"" + server.url(host, "/token") + "\"";
+      "_authorization_endpoint\":\"" + provider.url(host, "/authorize") + "\",\"" + client +
+      "_token_endpoint\":\"" + provider.url(host, "/token") + "\"";
   test::writeConfig("profile.conf", R"({"sso_enable":true,"sso_profile":")" + client + "\"}", 0644);
   if (client == "websphere") {
     test::writeConfig("websphere.conf", "{" + common + "}");
@@ -176,14 +166,14 @@ std::vector<std::pair<std::string, std::string>> setUp(const std::string& client
   }
   test::writeConfig("azure.conf",
                     "{" + common + R"(,"azure_sso_enable":true,"azure_tenant_id":"t",)" +
-                        "\"azure_logout_endpoint\":\"" + server.url(host, "/logout") +
-                        "\",\"azure_wellknown\":\"" + server.url(host, "/discovery") + "\"}");
+                        "\"azure_logout_endpoint\":\"" + provider.url(host, "/logout") +
+                        "\",\"azure_wellknown\":\"" + provider.url(host, "/discovery") + "\"}");
   const test::RsaKey& key = test::anyRsaKey();
   const std::string token =
       test::rsaToken(key, R"({"alg":"RS256","kid":"key-1"})",
                      R"({"unique_name":"alice@corp.example","tid":"t",)" + exp + "}");
   return {{"/token", R"({"id_token":")" + token + "\"}"},
-          {"/discovery", R"({"jwks_uri":")" + server.url(host, "/keys") + "\"}"},
+          {"/discovery", R"({"jwks_uri":")" + provider.url(host, "/keys") + "\"}"},
           {"/keys", R"({"keys":[)" + key.jwk("key-1") + "]}"}};
 }
 
@@ -389,9 +379,9 @@ int run(const std::vector<std::string>& arguments) {
   const test::Ca authority;
   if (has("tls")) authority.trust();
   if (has("name")) test::resolveToLoopback(kHost);
-  Server server(has("tls"), authority);
+  Provider provider(has("tls"), authority);
   const std::string host = has("name") ? kHost : has("tls") ? "localhost" : "127.0.0.1";
-  const pid_t provider = server.start(setUp(client, server, host));
+  provider.start(setUp(client, provider, host));
   std::printf("%s, %ld logins%s\n", client.c_str(), logins,
               has("processes") ? " in processes" : "");
   std::string defect;
@@ -400,10 +390,8 @@ int run(const std::vector<std::string>& arguments) {
   }
   const bool good = has("processes") ? inManyProcesses(client, logins)
                                      : inOneProcess(client, logins, defect, has("name"));
-  kill(provider, SIGKILL);
-  int status = 0;
-  require(waitpid(provider, &status, 0) == provider, "no provider");
-  require(waitpid(-1, &status, WNOHANG) == -1, "a process was left behind");
+  provider.stop();
+  require(waitpid(-1, nullptr, WNOHANG) == -1, "a process was left behind");
   return good ? 0 : 1;
 }
 

@@ -1,22 +1,16 @@
 #include "support/hostile.h"
 
-#include <arpa/inet.h>
 #include <netinet/in.h>
 #include <netinet/tcp.h>
 #include <openssl/pem.h>
 #include <openssl/ssl.h>
 #include <sys/mman.h>
-#include <sys/prctl.h>
 #include <sys/socket.h>
 #include <sys/time.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <atomic>
-#include <csignal>
-#include <cstdint>
-#include <cstdio>
 #include <memory>
 #include <new>
 #include <stdexcept>
@@ -36,20 +30,6 @@ constexpr long kSilenceSeconds = 5;
 
 void require(bool good, const char* what) {
   if (!good) throw std::runtime_error(std::string("hostile provider: ") + what);
-}
-
-int listenOnLoopback(int* bound) {
-  const int socket = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  sockaddr_in address{};
-  address.sin_family = AF_INET;
-  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  socklen_t size = sizeof address;
-  require(socket >= 0 && bind(socket, reinterpret_cast<sockaddr*>(&address), size) == 0 &&
-              listen(socket, 16) == 0 &&
-              getsockname(socket, reinterpret_cast<sockaddr*>(&address), &size) == 0,
-          "cannot listen");
-  *bound = ntohs(address.sin_port);
-  return socket;
 }
 
 int chooseProtocol(SSL*, const unsigned char** chosen, unsigned char* size, const unsigned char*,
@@ -204,41 +184,17 @@ HostileProvider::HostileProvider(const Identity& own, const Dialect& spoken)
       mmap(nullptr, sizeof(Shared), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
   require(memory != MAP_FAILED, "memory");
   shared = new (memory) Shared;
-  listener = listenOnLoopback(&number);
 }
 
 HostileProvider::~HostileProvider() {
-  if (server > 0) {
-    kill(server, SIGKILL);
-    waitpid(server, nullptr, 0);
-  }
-  if (listener >= 0) close(listener);
   munmap(shared, sizeof(Shared));
 }
 
 void HostileProvider::start(Play script, unsigned seconds) {
-  require(server == 0, "started twice");
-  const pid_t parent = getpid();
-  server = fork();
-  require(server >= 0, "fork");
-  if (server != 0) {
-    close(listener);
-    listener = -1;
-    return;
-  }
-  prctl(PR_SET_PDEATHSIG, SIGKILL);
-  if (getppid() != parent) _exit(1);
-  alarm(seconds);
-  signal(SIGPIPE, SIG_IGN);
-  try {
-    serve(script);
-  } catch (const std::exception& e) {
-    std::fprintf(stderr, "%s\n", e.what());
-  }
-  _exit(1);
+  server.start([this, script](int listener) { serve(listener, script); }, seconds);
 }
 
-void HostileProvider::serve(const Play& script) {
+void HostileProvider::serve(int listener, const Play& script) {
   SSL_CTX* context = newContext(identity, dialect);
   for (;;) {
     const int socket = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
@@ -274,7 +230,7 @@ void HostileProvider::play(int round) {
 }
 
 std::string HostileProvider::url(const std::string& path, const std::string& host) const {
-  return "https://" + host + ":" + std::to_string(number) + path;
+  return "https://" + host + ":" + std::to_string(port()) + path;
 }
 
 int HostileProvider::turns() const {

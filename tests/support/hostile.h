@@ -8,13 +8,12 @@
 // The scripts are made in the server, a child process.
 #pragma once
 
-#include <sys/types.h>
-
 #include <cstddef>
 #include <functional>
 #include <string>
 
 #include "support/ca.h"
+#include "support/server.h"
 
 namespace test {
 
@@ -67,7 +66,7 @@ class HostileProvider {
   void play(int round);
 
   std::string url(const std::string& path, const std::string& host = "localhost") const;
-  int port() const { return number; }
+  int port() const { return server.port(); }
 
   // Of this round: connections, and requests that were read to their end.
   int turns() const;
@@ -78,14 +77,12 @@ class HostileProvider {
  private:
   struct Shared;
 
-  [[noreturn]] void serve(const Play& play);
+  [[noreturn]] void serve(int listener, const Play& play);
 
   Identity identity;
   Dialect dialect;
   Shared* shared;
-  int listener = -1;
-  int number = 0;
-  pid_t server = 0;
+  Server server;
 };
 
 }  // namespace test

@@ -1,20 +1,14 @@
 #include "support/provider.h"
 
-#include <arpa/inet.h>
-#include <netinet/in.h>
 #include <openssl/pem.h>
 #include <openssl/ssl.h>
 #include <strings.h>
 #include <sys/mman.h>
-#include <sys/prctl.h>
 #include <sys/socket.h>
 #include <sys/time.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <csignal>
-#include <cstdint>
 #include <cstring>
 #include <stdexcept>
 
@@ -26,23 +20,6 @@ constexpr long kSilenceSeconds = 20;
 
 void require(bool good, const char* what) {
   if (!good) throw std::runtime_error(std::string("test provider: ") + what);
-}
-
-int listenOn(int port, int* bound) {
-  const int socket = ::socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  const int on = 1;
-  setsockopt(socket, SOL_SOCKET, SO_REUSEADDR, &on, sizeof on);
-  sockaddr_in address{};
-  address.sin_family = AF_INET;
-  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  address.sin_port = htons(static_cast<std::uint16_t>(port));
-  socklen_t size = sizeof address;
-  require(socket >= 0 && bind(socket, reinterpret_cast<sockaddr*>(&address), size) == 0 &&
-              listen(socket, 16) == 0 &&
-              getsockname(socket, reinterpret_cast<sockaddr*>(&address), &size) == 0,
-          "cannot listen");
-  *bound = ntohs(address.sin_port);
-  return socket;
 }
 
 // One connection, plain or over TLS.
@@ -220,9 +197,7 @@ std::string Request::header(const std::string& name) const {
   return "";
 }
 
-Provider::Provider(int port) : records(memfd_create("requests", MFD_CLOEXEC)) {
-  listener = listenOn(port, &number);
-}
+Provider::Provider(int port) : server(port), records(memfd_create("requests", MFD_CLOEXEC)) {}
 
 Provider::Provider(const Identity& own, int port) : Provider(port) {
   identity = own;
@@ -230,43 +205,20 @@ Provider::Provider(const Identity& own, int port) : Provider(port) {
 }
 
 Provider::~Provider() {
-  if (server > 0) {
-    kill(server, SIGKILL);
-    waitpid(server, nullptr, 0);
-  }
-  if (listener >= 0) close(listener);
   close(records);
 }
 
 Provider& Provider::answer(const std::string& path, Answer answer) {
-  require(server == 0, "an answer after the start");
+  require(!server.isStarted(), "an answer after the start");
   script[path].push_back(std::move(answer));
   return *this;
 }
 
 void Provider::start() {
-  require(server == 0, "started twice");
-  const pid_t parent = getpid();
-  server = fork();
-  require(server >= 0, "fork");
-  if (server != 0) {
-    close(listener);
-    listener = -1;
-    return;
-  }
-  prctl(PR_SET_PDEATHSIG, SIGKILL);
-  if (getppid() != parent) _exit(1);
-  alarm(kLifeSeconds);
-  signal(SIGPIPE, SIG_IGN);
-  try {
-    serve();
-  } catch (const std::exception& e) {
-    std::fprintf(stderr, "%s\n", e.what());
-  }
-  _exit(1);
+  server.start([this](int listener) { serve(listener); }, kLifeSeconds);
 }
 
-void Provider::serve() {
+void Provider::serve(int listener) {
   SSL_CTX* context = tls ? newContext(identity) : nullptr;
   std::map<std::string, std::size_t> given;
   for (;;) {
@@ -289,7 +241,7 @@ void Provider::serve() {
 }
 
 std::string Provider::url(const std::string& path, const std::string& host) const {
-  return (tls ? "https://" : "http://") + host + ":" + std::to_string(number) + path;
+  return (tls ? "https://" : "http://") + host + ":" + std::to_string(port()) + path;
 }
 
 std::vector<Request> Provider::requests() const {
@@ -309,9 +261,7 @@ std::vector<Request> Provider::requests() const {
 }
 
 int unusedPort() {
-  int port = 0;
-  close(listenOn(0, &port));
-  return port;
+  return Server().port();
 }
 
 }  // namespace test

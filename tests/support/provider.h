@@ -10,8 +10,6 @@
 // The server is a child process. It ends with the Provider, with the test, or after 100 seconds.
 #pragma once
 
-#include <sys/types.h>
-
 #include <cstddef>
 #include <map>
 #include <memory>
@@ -19,6 +17,7 @@
 #include <vector>
 
 #include "support/ca.h"
+#include "support/server.h"
 
 namespace test {
 
@@ -63,21 +62,19 @@ class Provider {
   // From here on requests are answered; no more answers can be added.
   void start();
 
-  int port() const { return number; }
+  int port() const { return server.port(); }
   std::string url(const std::string& path, const std::string& host = "localhost") const;
 
   // Every request so far, in order. A request is there before its answer is sent.
   std::vector<Request> requests() const;
 
  private:
-  void serve();
+  [[noreturn]] void serve(int listener);
 
+  Server server;
   Identity identity;
   bool tls = false;
-  int listener = -1;
-  int records = -1;
-  int number = 0;
-  pid_t server = 0;
+  int records;
   std::map<std::string, std::vector<Answer>> script;
 };
 
