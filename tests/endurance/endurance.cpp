@@ -11,7 +11,6 @@
 #include <dirent.h>
 #include <dlfcn.h>
 #include <grp.h>
-#include <openssl/ssl.h>
 #include <pthread.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
@@ -45,6 +44,7 @@ constexpr char kClientID[] = "device-17";
 constexpr char kSecret[] = "the secret of device-17";
 constexpr char kHost[] = "provider.example";
 constexpr unsigned kLongestRun = 24 * 3600;  // seconds
+constexpr long kSilenceSeconds = 20;
 constexpr int kSamples = 40;
 constexpr long kWarmUpSamples = 10;
 // What the allocator may still move between two looks; a leak of a byte in each login is more.
@@ -60,7 +60,7 @@ void require(bool good, const std::string& what) {
 class Provider {
  public:
   Provider(bool tls, const test::Ca& authority) {
-    if (tls) context = newContext(authority.issue({kHost, "localhost"}));
+    if (tls) context = test::serverContext(authority.issue({kHost, "localhost"}));
   }
 
   std::string url(const std::string& host, const std::string& path) const {
@@ -81,57 +81,14 @@ class Provider {
   void stop() { server.stop(); }
 
  private:
-  static SSL_CTX* newContext(const test::Identity& identity) {
-    SSL_CTX* const made = SSL_CTX_new(TLS_server_method());
-    BIO* const certificate = BIO_new_mem_buf(identity.certificate.data(), -1);
-    BIO* const key = BIO_new_mem_buf(identity.key.data(), -1);
-    X509* const x = PEM_read_bio_X509(certificate, nullptr, nullptr, nullptr);
-    EVP_PKEY* const k = PEM_read_bio_PrivateKey(key, nullptr, nullptr, nullptr);
-    require(SSL_CTX_use_certificate(made, x) == 1 && SSL_CTX_use_PrivateKey(made, k) == 1,
-            "unusable certificate");
-    return made;  // the process's, as long as it runs
-  }
-
-  void serve(int connection) const {
-    SSL* ssl = nullptr;
-    if (context != nullptr) {
-      ssl = SSL_new(context);
-      SSL_set_fd(ssl, connection);
-      if (SSL_accept(ssl) == 1) answer(connection, ssl);
-      SSL_free(ssl);
-    } else {
-      answer(connection, nullptr);
-    }
-    close(connection);
-  }
-
   // Answers, and waits for the other side to close.
-  void answer(int connection, SSL* ssl) const {
-    std::string request;
-    char piece[8192];
-    for (bool answered = false;;) {
-      const auto count = ssl != nullptr ? SSL_read(ssl, piece, sizeof piece)
-                                        : static_cast<int>(read(connection, piece, sizeof piece));
-      if (count <= 0) return;
-      if (answered) continue;
-      request.append(piece, static_cast<std::size_t>(count));
-      if (!isWhole(request)) continue;
-      answered = true;
-      const std::string& text = answerTo(request);
-      const auto size = static_cast<int>(text.size());
-      const auto sent = ssl != nullptr
-                            ? SSL_write(ssl, text.data(), size)
-                            : static_cast<int>(write(connection, text.data(), text.size()));
-      if (sent != size) return;
+  void serve(int accepted) const {
+    test::Connection connection(accepted, kSilenceSeconds);
+    if (context != nullptr && !connection.shakeHands(context.get())) return;
+    const std::string request = connection.receiveRequest();
+    if (request.empty() || !connection.send(answerTo(request))) return;
+    for (std::string rest; connection.receive(&rest);) {
     }
-  }
-
-  static bool isWhole(const std::string& request) {
-    const std::size_t end = request.find("\r\n\r\n");
-    if (end == std::string::npos) return false;
-    const std::size_t length = request.find("Content-Length: ");
-    if (length == std::string::npos || length > end) return true;
-    return request.size() >= end + 4 + std::stoul(request.substr(length + 16));
   }
 
   const std::string& answerTo(const std::string& request) const {
@@ -143,7 +100,7 @@ class Provider {
   }
 
   test::Server server;
-  SSL_CTX* context = nullptr;
+  std::shared_ptr<SSL_CTX> context;
   std::vector<std::pair<std::string, std::string>> answers;
 };
 

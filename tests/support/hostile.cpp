@@ -2,11 +2,9 @@
 
 #include <netinet/in.h>
 #include <netinet/tcp.h>
-#include <openssl/pem.h>
 #include <openssl/ssl.h>
 #include <sys/mman.h>
 #include <sys/socket.h>
-#include <sys/time.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -40,112 +38,17 @@ int chooseProtocol(SSL*, const unsigned char** chosen, unsigned char* size, cons
   return SSL_TLSEXT_ERR_OK;
 }
 
-SSL_CTX* newContext(const Identity& identity, const Dialect& dialect) {
-  SSL_CTX* context = SSL_CTX_new(TLS_server_method());
-  BIO* certificate = BIO_new_mem_buf(identity.certificate.data(), -1);
-  BIO* key = BIO_new_mem_buf(identity.key.data(), -1);
-  X509* x = PEM_read_bio_X509(certificate, nullptr, nullptr, nullptr);
-  EVP_PKEY* k = PEM_read_bio_PrivateKey(key, nullptr, nullptr, nullptr);
+std::shared_ptr<SSL_CTX> contextOf(const Identity& identity, const Dialect& dialect) {
+  auto context = serverContext(identity);
   if (!dialect.ciphers.empty())
-    require(SSL_CTX_set_cipher_list(context, dialect.ciphers.c_str()) == 1, "ciphers");
-  require(SSL_CTX_use_certificate(context, x) == 1 && SSL_CTX_use_PrivateKey(context, k) == 1,
-          "unusable certificate");
-  SSL_CTX_set_min_proto_version(context, dialect.oldest);
-  SSL_CTX_set_max_proto_version(context, dialect.newest);
+    require(SSL_CTX_set_cipher_list(context.get(), dialect.ciphers.c_str()) == 1, "ciphers");
+  SSL_CTX_set_min_proto_version(context.get(), dialect.oldest);
+  SSL_CTX_set_max_proto_version(context.get(), dialect.newest);
   if (!dialect.protocol.empty())
-    SSL_CTX_set_alpn_select_cb(context, chooseProtocol,
+    SSL_CTX_set_alpn_select_cb(context.get(), chooseProtocol,
                                const_cast<std::string*>(&dialect.protocol));
-  X509_free(x);
-  EVP_PKEY_free(k);
-  BIO_free(certificate);
-  BIO_free(key);
   return context;
 }
-
-// One connection, which is closed as its script says.
-class Guest {
- public:
-  explicit Guest(int accepted) : socket(accepted) {
-    const timeval silence{kSilenceSeconds, 0};
-    const int on = 1;
-    setsockopt(socket, SOL_SOCKET, SO_RCVTIMEO, &silence, sizeof silence);
-    setsockopt(socket, SOL_SOCKET, SO_SNDTIMEO, &silence, sizeof silence);
-    setsockopt(socket, IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);
-  }
-  ~Guest() {
-    SSL_free(ssl);
-    close(socket);
-  }
-  Guest(const Guest&) = delete;
-  Guest& operator=(const Guest&) = delete;
-
-  // Reads the client's first message, in the clear. False if nothing came.
-  bool hear(std::string* message) const {
-    char piece[16384];
-    const ssize_t n = recv(socket, piece, sizeof piece, 0);
-    if (n > 0) message->assign(piece, static_cast<std::size_t>(n));
-    return n > 0;
-  }
-
-  bool shakeHands(SSL_CTX* context) {
-    ssl = SSL_new(context);
-    SSL_set_fd(ssl, socket);
-    if (SSL_accept(ssl) == 1) return true;
-    SSL_free(ssl);
-    ssl = nullptr;
-    return false;
-  }
-
-  // A whole request; an empty text if there is none.
-  std::string request() const {
-    std::string raw;
-    for (std::size_t size = std::string::npos; raw.size() < size;) {
-      char piece[16384];
-      const int n = SSL_read(ssl, piece, sizeof piece);
-      if (n <= 0) return "";
-      raw.append(piece, static_cast<std::size_t>(n));
-      const std::size_t end = raw.find("\r\n\r\n");
-      if (end == std::string::npos) continue;
-      const std::size_t length = raw.find("Content-Length: ");
-      size = end + 4 + (length < end ? std::stoul(raw.substr(length + 16)) : 0);
-    }
-    return raw;
-  }
-
-  bool send(const std::string& text, std::size_t piece) const {
-    if (piece == 0) piece = std::max<std::size_t>(text.size(), 1);
-    for (std::size_t at = 0; at < text.size(); at += piece) {
-      if (!sendAll(text.data() + at, std::min(piece, text.size() - at))) return false;
-    }
-    return true;
-  }
-
-  void end(Script::End how) const {
-    const linger at_once{1, 0};
-    if (how == Script::End::kReset) {
-      setsockopt(socket, SOL_SOCKET, SO_LINGER, &at_once, sizeof at_once);
-      return;
-    }
-    if (ssl != nullptr && how == Script::End::kClose) SSL_shutdown(ssl);
-    shutdown(socket, SHUT_WR);
-  }
-
- private:
-  bool sendAll(const char* data, std::size_t size) const {
-    while (size > 0) {
-      const std::size_t most = std::min<std::size_t>(size, 1 << 20);
-      const auto n = ssl != nullptr ? SSL_write(ssl, data, static_cast<int>(most))
-                                    : static_cast<int>(::send(socket, data, most, 0));
-      if (n <= 0) return false;
-      data += n;
-      size -= static_cast<std::size_t>(n);
-    }
-    return true;
-  }
-
-  int socket;
-  SSL* ssl = nullptr;
-};
 
 // The server's first messages in answer to this one of the client.
 std::string firstFlight(SSL_CTX* context, const std::string& hello) {
@@ -161,18 +64,18 @@ std::string firstFlight(SSL_CTX* context, const std::string& hello) {
   return flight;
 }
 
-void sendScript(const Guest& guest, const Script& script) {
+void sendScript(const Connection& guest, const Script& script) {
   bool going = guest.send(script.bytes, script.piece);
   if (script.filler > 0) {
     std::string fill = script.fill;
     while (fill.size() < (1 << 18)) fill += fill;
     for (std::size_t left = script.filler; going && left > 0;) {
       const std::size_t most = std::min(left, fill.size());
-      going = guest.send(most == fill.size() ? fill : fill.substr(0, most), 0);
+      going = guest.send(most == fill.size() ? fill : fill.substr(0, most));
       left -= most;
     }
   }
-  if (going) guest.send(script.tail, 0);
+  if (going) guest.send(script.tail);
   if (script.silenceMs > 0) usleep(static_cast<useconds_t>(script.silenceMs) * 1000);
 }
 
@@ -195,24 +98,26 @@ void HostileProvider::start(Play script, unsigned seconds) {
 }
 
 void HostileProvider::serve(int listener, const Play& script) {
-  SSL_CTX* context = newContext(identity, dialect);
+  const auto context = contextOf(identity, dialect);
+  const int on = 1;
   for (;;) {
     const int socket = accept4(listener, nullptr, nullptr, SOCK_CLOEXEC);
     require(socket >= 0, "accept");
-    Guest guest(socket);
+    setsockopt(socket, IPPROTO_TCP, TCP_NODELAY, &on, sizeof on);  // pieces stay pieces
+    Connection guest(socket, kSilenceSeconds);
     const int turn = shared->turns++;
     const Script act = script(shared->round, turn);
     std::string heard;
     if (act.stage == Script::Stage::kHello || act.stage == Script::Stage::kFlight) {
-      if (!guest.hear(&heard)) continue;
+      if (!guest.receive(&heard)) continue;
     }
     if (act.stage == Script::Stage::kFlight) {
-      const std::string flight = firstFlight(context, heard);
-      guest.send(flight.substr(0, flight.size() * act.flight / 1000), 0);
+      const std::string flight = firstFlight(context.get(), heard);
+      guest.send(flight.substr(0, flight.size() * act.flight / 1000));
     }
-    if (act.stage >= Script::Stage::kHandshake && !guest.shakeHands(context)) continue;
+    if (act.stage >= Script::Stage::kHandshake && !guest.shakeHands(context.get())) continue;
     if (act.stage == Script::Stage::kRequest) {
-      const std::string request = guest.request();
+      const std::string request = guest.receiveRequest();
       if (request.empty()) continue;
       ++shared->requests;
       if (request.substr(0, request.find('\r')).find("stray") != std::string::npos)

@@ -27,11 +27,7 @@ struct Script {
     kHandshake,  // the request is not read
     kRequest,    // the whole request is read
   };
-  enum class End {
-    kClose,  // as TLS wants it
-    kCut,    // the connection is closed, TLS is not
-    kReset,
-  };
+  using End = Connection::End;
 
   Stage stage = Stage::kRequest;
   unsigned flight = 0;

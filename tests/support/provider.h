@@ -37,17 +37,6 @@ struct Answer {
 Answer ok(std::string body);
 Answer failed(int status, std::string body);
 
-struct Request {
-  std::string raw;     // as received, header and body
-  std::string method;  // "GET"
-  std::string target;  // path and query, as received
-  std::string body;
-  std::vector<std::string> headers;  // whole lines, in order
-
-  // The value of a header, empty if there is none; the name's case does not matter.
-  std::string header(const std::string& name) const;
-};
-
 class Provider {
  public:
   explicit Provider(int port = 0);                       // HTTP; port 0: any free port
