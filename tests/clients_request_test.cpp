@@ -1,6 +1,5 @@
 // The authorization request and the body of the code exchange.
 #include <gtest/gtest.h>
-#include <openssl/evp.h>
 
 #include <array>
 #include <regex>
@@ -34,18 +33,6 @@ Json::Value Settings() {
 const char kClientID[] = "device%207%2F%C3%BC%26%3D%2B";
 const char kSecret[] = "s3cret%26more%3D%3F%2541";
 const char kRedirectURI[] = "https%3A%2F%2Fnas.example.com%2Fwebman%2Flogin.cgi%3Fsso%3D1%26x%3Dy";
-
-std::string MD5Of(const std::string& text) {
-  unsigned char digest[EVP_MAX_MD_SIZE];
-  unsigned length = 0;
-  EVP_Digest(text.data(), text.size(), digest, &length, EVP_md5(), nullptr);
-  std::string hex;
-  for (unsigned i = 0; i < length; ++i) {
-    hex += "0123456789abcdef"[digest[i] >> 4];
-    hex += "0123456789abcdef"[digest[i] & 15];
-  }
-  return hex;
-}
 
 // The parts of an authorization URL that differ from call to call.
 struct Request {
@@ -81,7 +68,7 @@ class ClientRequest : public testing::Test {
   // The state of a request, without its nonce, which is checked.
   static std::string StateWithoutNonce(const Json::Value& parameters) {
     const Request request = Ask(parameters);
-    const std::string nonce = "\"nonce\":\"" + MD5Of(request.nonce) + "\"";
+    const std::string nonce = "\"nonce\":\"" + test::md5(request.nonce) + "\"";
     const size_t at = request.state.find(nonce);
     EXPECT_NE(at, std::string::npos) << request.state;
     EXPECT_EQ(request.state.find("nonce", at + nonce.size()), std::string::npos);
@@ -147,7 +134,7 @@ TYPED_TEST(ClientRequest, HasANonceThatIsRandomInEveryDigit) {
 
 TYPED_TEST(ClientRequest, CarriesTheDigestOfTheNonceAloneForNull) {
   const Request request = this->Ask(Json::Value());
-  EXPECT_EQ(request.state, "{\"nonce\":\"" + MD5Of(request.nonce) + "\"}\n");
+  EXPECT_EQ(request.state, "{\"nonce\":\"" + test::md5(request.nonce) + "\"}\n");
 }
 
 TYPED_TEST(ClientRequest, CarriesTheCallersObject) {

@@ -47,6 +47,18 @@ std::string base64(const std::string& bytes) {
   return text;
 }
 
+std::string md5(const std::string& text) {
+  unsigned char digest[EVP_MAX_MD_SIZE];
+  unsigned size = 0;
+  EVP_Digest(text.data(), text.size(), digest, &size, EVP_md5(), nullptr);
+  std::string hex;
+  for (unsigned i = 0; i < size; ++i) {
+    hex += "0123456789abcdef"[digest[i] >> 4];
+    hex += "0123456789abcdef"[digest[i] & 15];
+  }
+  return hex;
+}
+
 std::string base64url(const std::string& bytes) {
   std::string text = base64(bytes);
   for (char& c : text) c = c == '+' ? '-' : c == '/' ? '_' : c;

@@ -11,6 +11,7 @@ namespace test {
 std::string base64(const std::string& bytes);     // RFC 4648, section 4
 std::string base64url(const std::string& bytes);  // RFC 4648, section 5, without padding
 std::string fromBase64(const std::string& text);  // either alphabet, padded or not
+std::string md5(const std::string& text);         // in hexadecimal, lower case
 
 class RsaKey {
  public:

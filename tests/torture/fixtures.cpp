@@ -40,22 +40,6 @@ std::string forged(const std::string& token, const std::string& other) {
   return token.substr(0, token.rfind('.')) + other.substr(other.rfind('.'));
 }
 
-std::string hexOf(const std::string& bytes) {
-  std::string hex;
-  for (const char byte : bytes) {
-    hex += "0123456789abcdef"[static_cast<unsigned char>(byte) >> 4];
-    hex += "0123456789abcdef"[static_cast<unsigned char>(byte) & 15];
-  }
-  return hex;
-}
-
-std::string md5(const std::string& text) {
-  unsigned char digest[EVP_MAX_MD_SIZE];
-  unsigned size = 0;
-  EVP_Digest(text.data(), text.size(), digest, &size, EVP_md5(), nullptr);
-  return hexOf(std::string(reinterpret_cast<char*>(digest), size));
-}
-
 Json::Value made() {
   const test::RsaKey key;
   const std::string body = claims().toStyledString();
@@ -83,7 +67,7 @@ Json::Value made() {
   all["key"] = test::base64url(kSecret);
   all["state"] = test::base64(R"({"origin":"/a page of some length"})");
   all["text"] = "a text & a name, longer than a string holds in itself";
-  all["digest"] = md5(all["text"].asString());
+  all["digest"] = test::md5(all["text"].asString());
   const test::Ca authority;
   const test::Identity server = authority.issue({"localhost"});
   all["authority"] = authority.certificate();

@@ -12,6 +12,7 @@
 #include "sso/utils.h"
 #include "sso/webspheresso.h"
 #include "support/device.h"
+#include "support/tokens.h"
 #include "torture/operation.h"
 
 namespace torture {
@@ -200,18 +201,6 @@ std::map<std::string, std::string> parametersOf(const std::string& text) {
   return values;
 }
 
-std::string md5(const std::string& text) {
-  unsigned char digest[EVP_MAX_MD_SIZE];
-  unsigned size = 0;
-  EVP_Digest(text.data(), text.size(), digest, &size, EVP_md5(), nullptr);
-  std::string hex;
-  for (unsigned i = 0; i < size; ++i) {
-    hex += "0123456789abcdef"[digest[i] >> 4];
-    hex += "0123456789abcdef"[digest[i] & 15];
-  }
-  return hex;
-}
-
 extern "C" int ReferenceBase64Decode(const char* text, std::size_t length, char* bytes,
                                      std::size_t* size);
 
@@ -233,7 +222,7 @@ std::string kindOfRequest(const std::string& url) {
   }
   const std::string digest = json["nonce"].asString();
   if (digest.empty()) return "without digest";
-  return digest == md5(values["nonce"]) ? "whole" : "another digest";
+  return digest == test::md5(values["nonce"]) ? "whole" : "another digest";
 }
 
 std::string kindOfTokenRequest(const std::string& body) {
