@@ -5,7 +5,6 @@
 #include <grp.h>
 #include <json/reader.h>
 #include <json/writer.h>
-#include <sys/mman.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -21,6 +20,7 @@
 #include "sso/sso.h"
 #include "support/log.h"
 #include "support/tokens.h"
+#include "support/unnamed_file.h"
 
 namespace test {
 namespace {
@@ -58,24 +58,6 @@ void install(const std::string& library) {
   const auto over = fs::copy_options::overwrite_existing;
   fs::copy_file(DOCTOR, "/usr/qova/bin/ssoclient-doctor", over);
   fs::copy_file(library, "/usr/qova/lib/libssoclient.so.1", over);
-}
-
-int fileWith(const std::string& text) {
-  const int file = memfd_create("doctor", MFD_CLOEXEC);
-  require(file >= 0, "no file");
-  require(write(file, text.data(), text.size()) == static_cast<ssize_t>(text.size()), "write");
-  lseek(file, 0, SEEK_SET);
-  return file;
-}
-
-std::string contents(int file) {
-  std::string text;
-  char piece[4096];
-  for (ssize_t n; (n = pread(file, piece, sizeof piece, static_cast<off_t>(text.size()))) > 0;) {
-    text.append(piece, static_cast<std::size_t>(n));
-  }
-  close(file);
-  return text;
 }
 
 [[noreturn]] void execDoctor(const Site& site, const std::vector<std::string>& arguments) {
@@ -205,15 +187,17 @@ Outcome runDoctor(const Site& site, bool text) {
   if (!text) arguments.push_back("--json");
   if (site.passToken) arguments.push_back("--token");
   arguments.insert(arguments.end(), site.arguments.begin(), site.arguments.end());
-  const int in = fileWith(site.passToken ? site.idToken() + "\n" : "");
-  const int out = fileWith("");
-  const int err = fileWith("");
+  const UnnamedFile in;
+  const UnnamedFile out;
+  const UnnamedFile err;
+  if (site.passToken) in.put(site.idToken() + "\n");
+  lseek(in.descriptor(), 0, SEEK_SET);  // for the tool to read from the start
   const pid_t child = fork();
   require(child >= 0, "fork");
   if (child == 0) {
-    dup2(in, STDIN_FILENO);
-    dup2(out, STDOUT_FILENO);
-    dup2(err, STDERR_FILENO);
+    dup2(in.descriptor(), STDIN_FILENO);
+    dup2(out.descriptor(), STDOUT_FILENO);
+    dup2(err.descriptor(), STDERR_FILENO);
     execDoctor(site, arguments);
   }
   Outcome run;
@@ -221,9 +205,8 @@ Outcome runDoctor(const Site& site, bool text) {
   while (waitpid(child, &status, 0) < 0 && errno == EINTR) {
   }
   run.status = WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
-  close(in);
-  run.out = contents(out);
-  run.err = contents(err);
+  run.out = out.contents();
+  run.err = err.contents();
   const bool json = !text && !run.out.empty() && run.out[0] == '{';
   if (json) run.document = parsed(run.out);
   return run;

@@ -2,7 +2,6 @@
 
 #include <grp.h>
 #include <gtest/gtest.h>
-#include <sys/mman.h>
 #include <sys/mount.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
@@ -15,6 +14,8 @@
 #include <sstream>
 #include <stdexcept>
 
+#include "support/unnamed_file.h"
+
 namespace test {
 namespace {
 
@@ -22,49 +23,9 @@ namespace {
   throw std::runtime_error(what + ": " + std::strerror(errno));
 }
 
-// A file without a name, on no file system.
-int newFile() {
-  const int file = memfd_create("test", 0);
-  if (file < 0) fail("memfd_create");
-  return file;
-}
-
-std::string contents(int file) {
-  std::string text;
-  char piece[4096];
-  for (ssize_t n; (n = pread(file, piece, sizeof piece, static_cast<off_t>(text.size()))) > 0;) {
-    text.append(piece, static_cast<std::size_t>(n));
-  }
-  return text;
-}
-
-void put(int file, const std::string& text) {
-  for (std::size_t done = 0; done < text.size();) {
-    const ssize_t n = write(file, text.data() + done, text.size() - done);
-    if (n <= 0) fail("write");
-    done += static_cast<std::size_t>(n);
-  }
-}
-
 void flushAll() {
   std::cout.flush();
   std::fflush(nullptr);
-}
-
-// What the child hands back: each part is its length, a line feed, and its bytes.
-void putPart(int file, const std::string& part) {
-  put(file, std::to_string(part.size()) + "\n" + part);
-}
-
-std::vector<std::string> partsOf(const std::string& text) {
-  std::vector<std::string> parts;
-  for (std::size_t at = 0; at < text.size();) {
-    const std::size_t line = text.find('\n', at);
-    const std::size_t size = std::stoul(text.substr(at, line - at));
-    parts.push_back(text.substr(line + 1, size));
-    at = line + 1 + size;
-  }
-  return parts;
 }
 
 void takeIds(Ids user, Ids group) {
@@ -95,7 +56,8 @@ std::string guarded(Ids user, Ids group, const std::function<std::string()>& bod
   _exit(0);
 }
 
-[[noreturn]] void runChild(int report, Ids user, Ids group,
+// Hands back file, line and text of each failure, and then the answer.
+[[noreturn]] void runChild(const UnnamedFile& report, Ids user, Ids group,
                            const std::function<std::string()>& body) {
   const testing::TestResult& result =
       *testing::UnitTest::GetInstance()->current_test_info()->result();
@@ -104,11 +66,11 @@ std::string guarded(Ids user, Ids group, const std::function<std::string()>& bod
   for (int i = before; i < result.total_part_count(); ++i) {
     const testing::TestPartResult& part = result.GetTestPartResult(i);
     if (!part.failed()) continue;
-    putPart(report, part.file_name() != nullptr ? part.file_name() : "");
-    putPart(report, std::to_string(part.line_number()));
-    putPart(report, part.message());
+    report.putPart(part.file_name() != nullptr ? part.file_name() : "");
+    report.putPart(std::to_string(part.line_number()));
+    report.putPart(part.message());
   }
-  putPart(report, answer);
+  report.putPart(answer);
   endChild();
 }
 
@@ -156,8 +118,8 @@ void resolveToLoopback(const std::string& host) {
 std::string stdoutOf(const std::function<void()>& call) {
   flushAll();
   const int before = dup(1);
-  const int file = newFile();
-  dup2(file, 1);
+  const UnnamedFile file;
+  dup2(file.descriptor(), 1);
   const auto restore = [&] {
     flushAll();
     dup2(before, 1);
@@ -167,13 +129,10 @@ std::string stdoutOf(const std::function<void()>& call) {
     call();
   } catch (...) {
     restore();
-    close(file);
     throw;
   }
   restore();
-  const std::string text = contents(file);
-  close(file);
-  return text;
+  return file.contents();
 }
 
 CoutRecorder::CoutRecorder() : before(std::cout.rdbuf(this)) {}
@@ -199,20 +158,18 @@ int CoutRecorder::sync() {
 std::string asProcess(Ids user, Ids group, const std::function<std::string()>& body) {
   requireSandbox();
   flushAll();
-  const int report = newFile();
+  const UnnamedFile report;
   const pid_t child = fork();
   if (child < 0) fail("fork");
   if (child == 0) runChild(report, user, group, body);
   int status = 0;
   while (waitpid(child, &status, 0) < 0 && errno == EINTR) {
   }
-  const std::string text = contents(report);
-  close(report);
   if (WIFSIGNALED(status)) {
     ADD_FAILURE() << "the child process was ended by signal " << WTERMSIG(status);
     return "";
   }
-  const auto parts = partsOf(text);
+  const auto parts = report.parts();
   if (parts.empty()) {
     ADD_FAILURE() << "the child process ended with status " << WEXITSTATUS(status);
     return "";

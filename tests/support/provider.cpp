@@ -1,6 +1,5 @@
 #include "support/provider.h"
 
-#include <sys/mman.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
@@ -54,11 +53,6 @@ void sendAnswer(const Connection& connection, const Answer& answer) {
   if (connection.send(text, piece) && answer.cut == std::string::npos) connection.end();
 }
 
-void record(int file, const std::string& raw) {
-  const std::string text = std::to_string(raw.size()) + "\n" + raw;
-  require(write(file, text.data(), text.size()) == static_cast<ssize_t>(text.size()), "record");
-}
-
 }  // namespace
 
 Answer ok(std::string body) {
@@ -72,15 +66,11 @@ Answer failed(int status, std::string body) {
   return answer;
 }
 
-Provider::Provider(int port) : server(port), records(memfd_create("requests", MFD_CLOEXEC)) {}
+Provider::Provider(int port) : server(port) {}
 
 Provider::Provider(const Identity& own, int port) : Provider(port) {
   identity = own;
   tls = true;
-}
-
-Provider::~Provider() {
-  close(records);
 }
 
 Provider& Provider::answer(const std::string& path, Answer answer) {
@@ -103,7 +93,7 @@ void Provider::serve(int listener) {
     if (tls && !connection.shakeHands(context.get())) continue;
     const std::string raw = connection.receiveRequest();
     if (raw.empty()) continue;
-    record(records, raw);
+    received.putPart(raw);
     const std::string target = parseRequest(raw).target;
     const std::string path = target.substr(0, target.find('?'));
     const auto found = script.find(path);
@@ -121,18 +111,8 @@ std::string Provider::url(const std::string& path, const std::string& host) cons
 }
 
 std::vector<Request> Provider::requests() const {
-  std::string text;
-  char piece[65536];
-  for (ssize_t n; (n = pread(records, piece, sizeof piece, static_cast<off_t>(text.size()))) > 0;) {
-    text.append(piece, static_cast<std::size_t>(n));
-  }
   std::vector<Request> all;
-  for (std::size_t at = 0; at < text.size();) {
-    const std::size_t line = text.find('\n', at);
-    const std::size_t size = std::stoul(text.substr(at, line - at));
-    all.push_back(parseRequest(text.substr(line + 1, size)));
-    at = line + 1 + size;
-  }
+  for (const std::string& raw : received.parts()) all.push_back(parseRequest(raw));
   return all;
 }
 

@@ -18,6 +18,7 @@
 
 #include "support/ca.h"
 #include "support/server.h"
+#include "support/unnamed_file.h"
 
 namespace test {
 
@@ -41,9 +42,6 @@ class Provider {
  public:
   explicit Provider(int port = 0);                       // HTTP; port 0: any free port
   explicit Provider(const Identity& own, int port = 0);  // HTTPS
-  ~Provider();
-  Provider(const Provider&) = delete;
-  Provider& operator=(const Provider&) = delete;
 
   // The next request for `path` (without a query) gets this answer. Answers to one path are
   // given in order; the last one is repeated. A path without an answer gets 404 and no body.
@@ -63,7 +61,7 @@ class Provider {
   Server server;
   Identity identity;
   bool tls = false;
-  int records;
+  UnnamedFile received;
   std::map<std::string, std::vector<Answer>> script;
 };
 

@@ -1,6 +1,5 @@
 // What the operations work with, and the provider that they talk to.
 #include <json/json.h>
-#include <sys/mman.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -11,6 +10,7 @@
 #include "support/device.h"
 #include "support/provider.h"
 #include "support/tokens.h"
+#include "support/unnamed_file.h"
 #include "torture/operation.h"
 
 namespace torture {
@@ -86,21 +86,16 @@ Fixtures& fixtures() {
 }
 
 void makeFixtures() {
-  const int file = memfd_create("fixtures", 0);
+  const test::UnnamedFile file;
   const pid_t child = fork();
   if (child == 0) {
-    const std::string text = made().toStyledString();
-    _exit(write(file, text.data(), text.size()) == static_cast<ssize_t>(text.size()) ? 0 : 1);
+    file.put(made().toStyledString());
+    _exit(0);
   }
   int status = 1;
   if (waitpid(child, &status, 0) != child || status != 0) throw std::runtime_error("fixtures");
-  std::string text(static_cast<std::size_t>(lseek(file, 0, SEEK_END)), '\0');
   Json::Value all;
-  if (pread(file, &text[0], text.size(), 0) != static_cast<ssize_t>(text.size()) ||
-      !Json::Reader().parse(text, all)) {
-    throw std::runtime_error("fixtures");
-  }
-  close(file);
+  if (!Json::Reader().parse(file.contents(), all)) throw std::runtime_error("fixtures");
   for (const std::string& name : all.getMemberNames()) {
     fixtures().texts[name] = all[name].asString();
   }
