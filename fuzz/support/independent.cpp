@@ -188,7 +188,9 @@ namespace {
 
 Json::CharReader* newReader() {
   Json::CharReaderBuilder builder;
-  builder["skipBom"] = false;  // the other reader knows of none
+  // What the other reader does not know.
+  builder["skipBom"] = false;
+  builder["allowTrailingCommas"] = false;
   return builder.newCharReader();
 }
 

@@ -363,6 +363,7 @@ void files(Seeds& seeds) {
   add("good-websphere", onWebSphere, "missing", websphere);
   add("good-comments", "/* on */" + onAzure + "// now", azure, websphere);
   add("good-line-break-in-a-value", onAzure, R"({"azure_client_id":"a\r\nb"})", "{}");
+  add("a-comma-too-many", R"({"sso_enable":true,})", azure, websphere);
   add("nothing-there", "missing", "missing", "missing");
   add("folders", "folder", "folder", "folder");
   add("empty-files", "", "", "");
