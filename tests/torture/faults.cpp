@@ -77,10 +77,12 @@ std::size_t slotOf(const void* memory) {
   return (reinterpret_cast<std::uintptr_t>(memory) >> 4) * 2654435761u % kSlots;
 }
 
+bool tracked = true;
+
 void sweep();
 
 void* note(void* memory, const void* caller) {
-  if (!armed || test::busy != 0 || memory == nullptr) return memory;
+  if (!tracked || !armed || test::busy != 0 || memory == nullptr) return memory;
   if (used > kSlots / 2) sweep();
   std::size_t slot = slotOf(memory);
   while (blocks[slot].memory != nullptr && blocks[slot].memory != kGone) slot = (slot + 1) % kSlots;
@@ -420,6 +422,10 @@ Armed::~Armed() {
 
 Seen seen() {
   return last;
+}
+
+void ignoreMemory() {
+  tracked = false;
 }
 
 Kept kept() {

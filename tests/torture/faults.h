@@ -39,6 +39,8 @@ struct Kept {
   std::string owner;  // the file of the code that asked for one of them
 };
 Kept kept();
+// From now on it is not kept track of, which takes much of the time of a short process.
+void ignoreMemory();
 
 // How often each function was called while armed, over all runs.
 struct Called {

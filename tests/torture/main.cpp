@@ -323,6 +323,7 @@ void runWarm(const Operation& operation) {
 // One plan, in a process in which the libraries have done nothing yet. What they set up for
 // good is not told apart from what they lose, so memory is not looked at.
 void runCold(const Operation& operation) {
+  ignoreMemory();
   bool hit = false;
   long more = 0;
   const bool good = runOnce(operation, report->next, &hit, &more);
