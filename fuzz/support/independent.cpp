@@ -75,8 +75,8 @@ std::optional<std::string> strictBase64url(const std::string& text) {
 
 std::string lenientBase64url(const std::string& text) {
   std::string clean;
-  for (char c : text) {
-    c = c == '+' ? '-' : c == '/' ? '_' : c;
+  for (char c : text.substr(0, text.find_last_not_of('=') + 1)) {
+    c = c == '+' ? '-' : c == '/' ? '_' : c == '=' ? 'A' : c;
     if (std::isspace(static_cast<unsigned char>(c)) != 0) continue;
     if (kAlphabet.find(c) == std::string::npos) break;
     clean += c;

@@ -20,8 +20,9 @@ std::string base64url(const std::string& bytes);  // RFC 4648, section 5, withou
 std::optional<std::string> strictBase64url(const std::string& text);
 std::optional<std::string> strictBase64(const std::string& text);  // padded
 std::string decoded(const std::string& text);                      // of a known good text
-// What the most lenient reader could make of it: white space skipped, up to the first character
-// that has no business there, left-over bits forgotten.
+// What the most lenient reader could make of it: white space skipped, a pad that is not at the end
+// read as zero bits (OpenSSL does), up to the first character that has no business there, left-over
+// bits forgotten.
 std::string lenientBase64url(const std::string& text);
 
 // n, e and, for a private key, d, as big-endian numbers; the caller owns the key. Null if OpenSSL

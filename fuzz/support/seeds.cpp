@@ -278,6 +278,9 @@ void answers(Seeds& seeds) {
   login("good-azure-rs512", "azure",
         fuzz::tokenResponse(fuzz::rsaToken(R"({"alg":"RS512","kid":"key-1"})", fuzz::kClaims)),
         fuzz::kDiscovery, fuzz::keySet());
+  std::string padded = fuzz::keySet();
+  padded.replace(padded.find("UsLA9e"), 6, "UsL=9e");
+  login("good-azure-pad-for-zero-bits-in-the-modulus", "azure", azure, fuzz::kDiscovery, padded);
   login("good-websphere-hs256", "websphere", fuzz::tokenResponse(token), "", "");
   login("azure-no-keys", "azure", azure, fuzz::kDiscovery, "{}");
   login("azure-hs256-under-the-modulus", "azure",
