@@ -160,7 +160,8 @@ std::size_t slotOf(Member member) {
   std::ptrdiff_t parts[2];
   static_assert(sizeof member == sizeof parts, "not the Itanium C++ ABI");
   std::memcpy(parts, &member, sizeof parts);
-#if defined(__arm__) || defined(__aarch64__)
+  // Where functions may have odd addresses, the mark of a virtual one stands in the other word.
+#if defined(__arm__) || defined(__aarch64__) || defined(__mips__)
   return static_cast<std::size_t>(parts[0]) / sizeof(void*) + 1;
 #else
   return static_cast<std::size_t>(parts[0] - 1) / sizeof(void*) + 1;
