@@ -124,7 +124,7 @@ def logins(programs, authority):
             commands["iddawc: login"] = [programs.path("cgi_iddawc"), "login"]
         commands["Authlib: login"] = ["/usr/bin/python3", os.path.join(HERE, "cgi/login_authlib.py"),
                                       "login"]
-        taken = measure.processes(programs.path("bench_process"), 15 if everything else 40,
+        taken = measure.processes(programs.path("bench_process"), 41,
                                   list(commands.values()))
         tables[what] = list(zip(commands, taken))
     return tables
