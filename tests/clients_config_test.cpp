@@ -7,6 +7,7 @@
 
 #include <cstdio>
 #include <memory>
+#include <ostream>
 #include <string>
 #include <type_traits>
 #include <vector>
@@ -246,6 +247,10 @@ struct Switch {
   const char* file;
   bool on;
 };
+
+void PrintTo(const Switch& each, std::ostream* out) {
+  *out << each.file;
+}
 
 class AzureSwitchParam : public testing::TestWithParam<Switch> {};
 
