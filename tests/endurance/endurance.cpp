@@ -2,7 +2,8 @@
 //
 //   endurance azure|websphere LOGINS [tls] [name]    in one process
 //   endurance azure|websphere LOGINS processes       each in a process of its own
-//   endurance azure|websphere LOGINS leak|open|thread  must fail: shows that the check sees it
+//   endurance azure|websphere LOGINS leak|open|thread      must fail: shows that the check sees it
+//   endurance azure|websphere LOGINS processes lose        valgrind must see it
 //
 // The client runs as a login program does: as a user, with root as the saved identity. Another
 // process looks at it from outside. With "name" the provider is known by a host name that libcurl
@@ -231,6 +232,7 @@ bool isFlat(const std::vector<Sample>& samples, bool byName) {
 void leave(const std::string& defect) {
   static std::vector<std::unique_ptr<std::string>> leaked;
   if (defect == "leak") leaked.push_back(std::make_unique<std::string>(512, 'x'));
+  if (defect == "lose") new std::string(512, 'x');
   if (defect == "open") require(dup(0) >= 0, "dup");
   pthread_t thread{};
   const auto nothing = [](void*) -> void* { return nullptr; };
@@ -251,7 +253,7 @@ struct Report {
     becomeLoginProgram();
     for (long done = 1; done <= logins; ++done) {
       login(client);
-      if (!defect.empty()) leave(defect);
+      leave(defect);
       if (done % (logins / kSamples) != 0) continue;
       const Report report{done, threadsStarted};
       char seen = 0;
@@ -290,7 +292,7 @@ bool inOneProcess(const std::string& client, long logins, const std::string& def
 }
 
 // Each login in a process of its own, four at a time.
-bool inManyProcesses(const std::string& client, long logins) {
+bool inManyProcesses(const std::string& client, long logins, const std::string& defect) {
   std::vector<long> sizes;
   long failed = 0;
   long running = 0;
@@ -303,6 +305,7 @@ bool inManyProcesses(const std::string& client, long logins) {
       try {
         becomeLoginProgram();
         login(client);
+        leave(defect);
         status = threadsStarted == 0 ? 0 : 2;
       } catch (const std::exception& e) {
         std::fprintf(stderr, "endurance: %s\n", e.what());
@@ -331,6 +334,7 @@ int run(const std::vector<std::string>& arguments) {
           "usage: endurance azure|websphere LOGINS [tls] [name] | [processes]");
   const std::string& client = arguments[0];
   const long logins = std::stol(arguments[1]);
+  require(has("processes") || logins >= kSamples, "too few logins to look at");
   test::requireSandbox();
 
   const test::Ca authority;
@@ -342,10 +346,10 @@ int run(const std::vector<std::string>& arguments) {
   std::printf("%s, %ld logins%s\n", client.c_str(), logins,
               has("processes") ? " in processes" : "");
   std::string defect;
-  for (const char* const word : {"leak", "open", "thread"}) {
+  for (const char* const word : {"leak", "lose", "open", "thread"}) {
     if (has(word)) defect = word;
   }
-  const bool good = has("processes") ? inManyProcesses(client, logins)
+  const bool good = has("processes") ? inManyProcesses(client, logins, defect)
                                      : inOneProcess(client, logins, defect, has("name"));
   provider.stop();
   require(waitpid(-1, nullptr, WNOHANG) == -1, "a process was left behind");
