@@ -45,6 +45,8 @@ struct Case {
 
 // The kinds of cases there are; the case of an index is of the kind index % kinds().
 std::size_t kinds();
+// The last so many kinds are right, and sign in.
+std::size_t controls();
 Case makeCase(const World& world, std::uint64_t seed, std::uint64_t index);
 
 }  // namespace hostile
