@@ -252,6 +252,50 @@ TEST(AttackKeyText, ThatStandsForNothingIsNotTheEmptyKey) {
   EXPECT_EQ(accepted, 5u);  // AA, AB, AAA, AAB, AAAA
 }
 
+// Whether this key text takes a signature under the key of these bytes.
+bool isKeyText(const std::string& text, const std::string& bytes) {
+  const std::string input = test::signingInput("{}", "{}");
+  QOVA::JWT::Jwt jwt(input + "." + base64url(test::hmac(bytes, input, "SHA256")));
+  std::string key = text;
+  try {
+    jwt.JwtHMACVerify(key, EVP_sha256());
+  } catch (const QOVA::JWT::jwt_verify_failed& e) {
+    EXPECT_STREQ(e.what(), "verify hmac signature failed");
+    return false;
+  }
+  return true;
+}
+
+// Pads in the wrong place are read as OpenSSL reads them, as zero bits: four characters that hold
+// nothing else are zero bytes, and those are the empty key to HMAC. A text of 4k + 1 characters is
+// no base64, whatever they are.
+TEST(AttackKeyText, OfPadsIsOfZeroBytes) {
+  for (const char* text : {"==", "===", "====", "A===", "A==", "=A", "======", "========"})
+    EXPECT_TRUE(isKeyText(text, "")) << text;
+  for (const char* text : {"=", "A", "=====", "A====", "=========", "B===", "Q===", "====Q==="})
+    EXPECT_FALSE(isKeyText(text, "")) << text;
+  EXPECT_TRUE(isKeyText("B===", "\4"));
+}
+
+// The client encodes its secret, so that pads stand where they belong: a secret of pads is those
+// bytes and no other key, and no byte but zero is the empty key.
+TEST_F(AttackWebSphereHeader, ReachesNoKeyTextOfPads) {
+  const auto isKey = [&](const std::string& secret, const std::string& key) {
+    settings["client_secret"] = secret;
+    test::configure<test::WebSphere>(settings);
+    const std::string token = test::hmacToken(key, goodHeader(), test::kBenchBody);
+    const bool taken = accepts(token);
+    EXPECT_NE(taken, static_cast<bool>(doubts(token))) << secret;
+    return taken;
+  };
+  for (const char* secret : {"=", "==", "===", "====", "A===", "A====", "========"}) {
+    EXPECT_FALSE(isKey(secret, "")) << secret;
+    EXPECT_TRUE(isKey(secret, secret)) << secret;
+  }
+  for (int byte = 0; byte < 256; ++byte)
+    EXPECT_EQ(isKey(std::string(1, static_cast<char>(byte)), ""), byte == 0) << byte;
+}
+
 class AttackKid : public AttackAzureHeader {
  protected:
   static std::string with(const std::string& kid) {
