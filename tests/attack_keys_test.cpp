@@ -6,6 +6,7 @@
 #include <openssl/param_build.h>
 #include <openssl/rsa.h>
 
+#include <algorithm>
 #include <ctime>
 #include <memory>
 #include <string>
@@ -361,7 +362,14 @@ TYPED_TEST(AttackCutToken, ResponsesHoldNoTokenWhereverTheyEnd) {
   }
   for (size_t size = 0; size < token.size(); ++size) {
     const std::string part = token.substr(0, size);
-    EXPECT_ANY_THROW(this->verify(part)) << size;
+    const bool whole = std::count(part.begin(), part.end(), '.') == 2;
+    if (part.empty()) {
+      EXPECT_TRUE(this->template refuses<std::invalid_argument>("token cannot be empty", part));
+    } else if (!whole) {
+      EXPECT_TRUE(this->template refuses<std::invalid_argument>("bad jwt format!", part)) << size;
+    } else {
+      EXPECT_TRUE(this->doubts(part)) << size;
+    }
   }
   EXPECT_TRUE(this->accepts(token));
 }

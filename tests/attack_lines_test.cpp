@@ -113,9 +113,32 @@ TYPED_TEST(AttackLines, InAnAddressSendNothing) {
     client.RequestWellknownInfo(document);
     EXPECT_TRUE(this->log.is({{LOG_ERR, "sso.cpp", curl_easy_strerror(CURLE_URL_MALFORMAT)}}));
   }
-  for (const test::Request& request : provider.requests()) {
-    EXPECT_EQ(request.header("X"), "");
-    EXPECT_EQ(request.raw.find("\n\n"), std::string::npos);
+  EXPECT_TRUE(provider.requests().empty());
+}
+
+// What the caller sets is kept as it is, and comes out encoded like the configured address.
+TYPED_TEST(AttackLines, OfARedirectUriThatIsSetLeaveHeaderAndBodyWhole) {
+  this->settings["authorization_endpoint"] = "https://x/";
+  this->settings["redirect_uri"] = "https://configured/";
+  test::configure<TypeParam>(this->settings);
+  for (const std::string& end : {std::string(kBreak), std::string("\r"), std::string("\n")}) {
+    typename TestFixture::Client client;
+    client.SetRedirectURI("https://nas/" + end);
+    EXPECT_EQ(client.GetRedirectURI(), "https://nas/" + end);
+    const std::string encoded = "https%3A%2F%2Fnas%2F" + URLEncode(end);
+    ASSERT_EQ(test::percentDecoded(encoded), "https://nas/" + end);
+    const std::string header =
+        test::stdoutOf([&] { client.RedirectAuthEndpoint(Json::Value(Json::objectValue)); });
+    EXPECT_EQ(header.find_first_of("\r\n"), header.size() - 2) << header;
+    EXPECT_EQ(header.find("Location: https://x/?client_id="), 0u) << header;
+    EXPECT_NE(header.find("&redirect_uri=" + encoded + "&response_type="), std::string::npos)
+        << header;
+    const std::string body = client.GetIDTokenReqParams();
+    EXPECT_FALSE(holdsBreak(body));
+    const auto parameters = test::parametersOf(body);
+    ASSERT_EQ(parameters.size(), 5u) << body;
+    EXPECT_EQ(parameters[4].first, "redirect_uri");
+    EXPECT_EQ(parameters[4].second, encoded);
   }
 }
 
@@ -162,12 +185,16 @@ TEST_F(AttackAzureLines, OfAnAddressAreEncodedInTheLogoutUrl) {
 }
 
 TEST_F(AttackAzureLines, OfANameReachThePlatformAsTheyAre) {
-  Client client;
-  const std::string claim = "A\r\nlice@co\nrp";
-  take(client, token(goodHeader(), "{\"unique_name\":" + test::jsonText(claim) + "}"));
-  std::string user;
-  client.GetUserName(user);
-  EXPECT_EQ(user, "CO\nRP\\A\r\nlice");
+  for (const char* name : {"unique_name", "email"}) {
+    Client client;
+    const std::string claim = "\nA\r\nlice\r@co\n\rrp\r\n";
+    take(client,
+         token(goodHeader(), std::string("{\"") + name + "\":" + test::jsonText(claim) + "}"));
+    std::string user;
+    client.GetUserName(user);
+    EXPECT_EQ(user, "CO\n\rRP\r\n\\\nA\r\nlice\r") << name;
+    EXPECT_TRUE(log.isEmpty());
+  }
 }
 
 TEST(AttackRelay, EncodesTheOriginAndNotTheReason) {
@@ -261,21 +288,36 @@ TEST(AttackPercent, EncodingFillsItsBufferToTheLastByte) {
 }
 
 TEST(AttackProfile, NameIsLoggedAsItStands) {
-  test::Log log;
-  test::writeConfig("profile.conf", "{\"sso_enable\":true,\"sso_profile\":" +
-                                        test::jsonText("azure\nroot: forged %s%n") + "}");
-  QOVA::SSO::SSOProfile profile;
-  EXPECT_TRUE(log.is({{LOG_ERR, "profile.cpp", "Profile 'azure\nroot: forged %s%n' not support"}}));
-  EXPECT_EQ(profile.GetSSOProfile(), "azure\nroot: forged %s%n");
-  std::string user;
-  EXPECT_TRUE(throws<QOVA::SSO::sso_exception>("profile not support.",
-                                               [&] { QOVA::SSO::OIDCLogin("code", user); }));
+  for (const std::string& name :
+       {std::string("azure\nroot: forged %s%n"), std::string("azure\r\nroot: forged"),
+        std::string("azure\r"), std::string("azure\n"), std::string(kBreak)}) {
+    test::Log log;
+    test::writeConfig("profile.conf",
+                      "{\"sso_enable\":true,\"sso_profile\":" + test::jsonText(name) + "}");
+    QOVA::SSO::SSOProfile profile;
+    EXPECT_TRUE(log.is({{LOG_ERR, "profile.cpp", "Profile '" + name + "' not support"}}));
+    EXPECT_EQ(profile.GetSSOProfile(), name);
+    std::string user;
+    EXPECT_TRUE(throws<QOVA::SSO::sso_exception>("profile not support.",
+                                                 [&] { QOVA::SSO::OIDCLogin("code", user); }));
+  }
+}
+
+using AttackWebSphereLines = AttackLines<test::WebSphere>;
+
+TEST_F(AttackWebSphereLines, OfASubjectStayInTheName) {
+  for (const char* name : {"A\r\nlice", "\r", "\n", "Alice\n", "\r\nAlice", kBreak}) {
+    Client client;
+    take(client, token(goodHeader(), "{\"sub\":" + test::jsonText(name) + "}"));
+    std::string user = "before";
+    client.GetUserName(user);
+    EXPECT_EQ(user, name);
+    EXPECT_TRUE(log.isEmpty());
+  }
 }
 
 // The borders of the two texts that the platform encodes into 1024 bytes: 765 bytes fit, and what
 // was encoded is whole.
-using AttackWebSphereLines = AttackLines<test::WebSphere>;
-
 TEST_F(AttackWebSphereLines, SecretsUpToTheBorderAreUsedWhole) {
   for (size_t size = 760; size <= 771; ++size) {
     std::string secret(size, 's');
