@@ -165,7 +165,8 @@ TEST_F(HostileProviderTest, SignsNobodyInWithBadAnswers) {
         return turn < 3 ? each.scripts[static_cast<std::size_t>(turn)] : test::Script();
       },
       3600);
-  play(hostile::kinds() - hostile::controls());  // a good login first: what is loaded once is loaded
+  play(hostile::kinds() -
+       hostile::controls());  // a good login first: what is loaded once is loaded
   const std::size_t files = openFiles();
   for (std::uint64_t index = first; index < first + cases; ++index) {
     play(index);
@@ -179,9 +180,10 @@ TEST_F(HostileProviderTest, SignsNobodyInWithBadAnswers) {
   EXPECT_EQ(signed_in, 1 + cases - badOf(first, cases)) << "those that are right, and the first";
   rusage usage{};
   getrusage(RUSAGE_SELF, &usage);
-  std::cout << "seed " << seed << ": " << refused << " bad answers of " << hostile::kinds() - hostile::controls()
-            << " kinds refused, " << signed_in << " good ones taken, " << connections
-            << " connections, largest " << usage.ru_maxrss / 1024 << " MB\n  ended in";
+  std::cout << "seed " << seed << ": " << refused << " bad answers of "
+            << hostile::kinds() - hostile::controls() << " kinds refused, " << signed_in
+            << " good ones taken, " << connections << " connections, largest "
+            << usage.ru_maxrss / 1024 << " MB\n  ended in";
   for (const auto& [kind, count] : ends)
     std::cout << " kind " << static_cast<int>(kind) << ": " << count << ";";
   std::cout << "\n";
