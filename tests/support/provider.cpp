@@ -94,14 +94,15 @@ void Provider::serve(int listener) {
     const std::string raw = connection.receiveRequest();
     if (raw.empty()) continue;
     received.putPart(raw);
-    const std::string target = parseRequest(raw).target;
-    const std::string path = target.substr(0, target.find('?'));
-    const auto found = script.find(path);
+    const Request request = parseRequest(raw);
+    const std::string path = request.target.substr(0, request.target.find('?'));
+    auto found = script.find(request.method + " " + path);
+    if (found == script.end()) found = script.find(path);
     if (found == script.end()) {
       sendAnswer(connection, failed(404, ""));
       continue;
     }
-    const std::size_t turn = std::min(given[path]++, found->second.size() - 1);
+    const std::size_t turn = std::min(given[found->first]++, found->second.size() - 1);
     sendAnswer(connection, found->second[turn]);
   }
 }

@@ -44,7 +44,8 @@ class Provider {
   explicit Provider(const Identity& own, int port = 0);  // HTTPS
 
   // The next request for `path` (without a query) gets this answer. Answers to one path are
-  // given in order; the last one is repeated. A path without an answer gets 404 and no body.
+  // given in order; the last one is repeated. A path without an answer gets 404 and no body. A
+  // path with a method in front ("POST /token") is for requests of that method alone.
   Provider& answer(const std::string& path, Answer answer);
   // From here on requests are answered; no more answers can be added.
   void start();

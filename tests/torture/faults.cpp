@@ -125,7 +125,10 @@ void* exhausted() {
 }
 
 void* newOrThrow(std::size_t size, const void* caller) {
-  if (fails(Kind::kMemory, "operator new")) throw std::bad_alloc();
+  if (fails(Kind::kMemory, "operator new")) {
+    errno = ENOMEM;
+    throw std::bad_alloc();
+  }
   void* const memory = __libc_malloc(size == 0 ? 1 : size);
   if (memory == nullptr) throw std::bad_alloc();
   return note(memory, caller);
@@ -216,10 +219,31 @@ FAULTY(long, BIO_ctrl, (BIO * bio, int command, long number, void* argument),
 
 // As libcurl does when its parts are not to be had: nothing is set up.
 FAULTY(CURLcode, curl_global_init, (long flags), (flags), CURLE_FAILED_INIT)
-FAULTY(CURL*, curl_easy_init, (), (), nullptr)
+FAULTY(CURL*, curl_easy_init, (), (), (errno = ENOMEM, nullptr))
 FAULTY(CURLcode, curl_easy_perform, (CURL * handle), (handle), CURLE_OUT_OF_MEMORY)
 
-// The address is copied, and is not set if that fails; the other options are set in any case.
+// The options that can be left unset, as a libcurl without them would; the failure then shows in
+// the request or in who is trusted. Where the answer goes to (WRITEFUNCTION, WRITEDATA) is set in
+// any case: libcurl cannot fail to keep a pointer, and without one of them would write to a stream
+// that is none.
+static const char* optionThatFails(CURLoption option) {
+  switch (option) {
+    case CURLOPT_URL:
+      return "curl_easy_setopt URL";
+    case CURLOPT_POSTFIELDS:
+      return "curl_easy_setopt POSTFIELDS";
+    case CURLOPT_SSL_VERIFYHOST:
+      return "curl_easy_setopt SSL_VERIFYHOST";
+    case CURLOPT_SSL_VERIFYPEER:
+      return "curl_easy_setopt SSL_VERIFYPEER";
+    case CURLOPT_WRITEFUNCTION:
+    case CURLOPT_WRITEDATA:
+      return nullptr;
+    default:
+      abort();  // the library sets an option that nobody has thought about
+  }
+}
+
 BEHIND(curl_easy_setopt);
 SPY CURLcode curl_easy_setopt(CURL* handle, CURLoption option, ...) {
   va_list arguments;
@@ -230,13 +254,12 @@ SPY CURLcode curl_easy_setopt(CURL* handle, CURLoption option, ...) {
   void* const pointer = option >= CURLOPTTYPE_OBJECTPOINT ? va_arg(arguments, void*) : nullptr;
   const long number = option < CURLOPTTYPE_OBJECTPOINT ? va_arg(arguments, long) : 0;
   va_end(arguments);
-  const bool address = option == CURLOPT_URL;
-  const bool failed = failsFor(CALLER, address ? "curl_easy_setopt URL" : "curl_easy_setopt");
-  if (failed && address) return CURLE_OUT_OF_MEMORY;
-  const CURLcode result = option < CURLOPTTYPE_OBJECTPOINT
-                              ? next_curl_easy_setopt()(handle, option, number)
-                              : next_curl_easy_setopt()(handle, option, pointer);
-  return failed ? CURLE_BAD_FUNCTION_ARGUMENT : result;
+  const char* const name = isLibrary(CALLER) ? optionThatFails(option) : nullptr;
+  if (name != nullptr && failsFor(CALLER, name)) {
+    return option == CURLOPT_URL ? CURLE_OUT_OF_MEMORY : CURLE_UNKNOWN_OPTION;
+  }
+  return option < CURLOPTTYPE_OBJECTPOINT ? next_curl_easy_setopt()(handle, option, number)
+                                          : next_curl_easy_setopt()(handle, option, pointer);
 }
 
 // Files: the settings, and the source of random bytes.

@@ -54,6 +54,14 @@ Json::Value made() {
   all["forged token"] = forged(rsa(header("RS256"), body), rsa(header("RS256"), "{}"));
   all["stranger's token"] = rsa(header("RS256", "a stranger"), body);
   all["azure HS256 token"] = hmac(header("HS256"), body);
+  Json::Value stranger = claims();
+  stranger["aud"] = "the identifier of another";
+  all["another audience token"] = rsa(header("RS256"), stranger.toStyledString());
+  all["another audience HS256 token"] = hmac(header("HS256"), stranger.toStyledString());
+  Json::Value mail = claims();
+  mail["email"] = mail["unique_name"];
+  mail.removeMember("unique_name");
+  all["email token"] = rsa(header("RS256"), mail.toStyledString());
   all["another tenant token"] = rsa(header("RS256"), claims("another").toStyledString());
   all["websphere token"] = hmac(header("HS256"), body);
   all["forged HS256 token"] = forged(hmac(header("HS256"), body), hmac(header("HS256"), "{}"));
@@ -73,6 +81,9 @@ Json::Value made() {
   all["authority"] = authority.certificate();
   all["server certificate"] = server.certificate;
   all["server key"] = server.key;
+  const test::Identity another = test::selfSigned({"another.example.com"});
+  all["stranger certificate"] = another.certificate;
+  all["stranger key"] = another.key;
   return all;
 }
 
@@ -112,21 +123,34 @@ std::string providerUrl(const std::string& path) {
 void startProvider(Operation::Server server) {
   provider.reset();
   if (server == Operation::Server::kNone) return;
-  provider = server == Operation::Server::kTls
-                 ? std::make_unique<test::Provider>(
-                       test::Identity{fixtures()["server certificate"], fixtures()["server key"]})
-                 : std::make_unique<test::Provider>();
+  if (server == Operation::Server::kPlain) {
+    provider = std::make_unique<test::Provider>();
+  } else {
+    const std::string who = server == Operation::Server::kTls ? "server" : "stranger";
+    provider = std::make_unique<test::Provider>(
+        test::Identity{fixtures()[who + " certificate"], fixtures()[who + " key"]});
+  }
   const auto response = [](const std::string& token) {
     return test::ok("{\"id_token\":\"" + token + "\"}");
   };
-  provider->answer("/azure-token", response(fixtures()["azure token"]));
-  provider->answer("/websphere-token", response(fixtures()["websphere token"]));
+  provider->answer("POST /azure-token", response(fixtures()["azure token"]));
+  provider->answer("POST /websphere-token", response(fixtures()["websphere token"]));
+  provider->answer("POST /forged-azure-token", response(fixtures()["forged token"]));
+  provider->answer("POST /forged-websphere-token", response(fixtures()["forged HS256 token"]));
+  for (const char* const path : {"/azure-token", "/websphere-token"}) {
+    provider->answer(path, test::failed(405, "not posted"));
+  }
   provider->answer("/discovery", test::ok("{\"jwks_uri\":\"" + providerUrl("/keys") + "\"}"));
   provider->answer("/keys", test::ok("{\"keys\":[" + fixtures()["jwk"] + "]}"));
   provider->answer("/bare-discovery",
                    test::ok("{\"jwks_uri\":\"" + providerUrl("/bare-keys") + "\"}"));
   provider->answer("/bare-keys", test::ok(R"({"keys":[{"kid":"the key of this year"}]})"));
+  provider->answer("/half-discovery",
+                   test::ok("{\"jwks_uri\":\"" + providerUrl("/half-keys") + "\"}"));
+  provider->answer("/half-keys",
+                   test::ok(R"({"keys":[{"kid":"the key of this year","n":"AQAB"}]})"));
   provider->answer("/text", test::ok("plain text of some length"));
+  provider->answer("POST /text", test::ok("plain text about what was posted"));
   provider->start();
 }
 

@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "torture/faults.h"
+#include "torture/lines.h"
 
 namespace torture {
 
@@ -26,6 +27,13 @@ class Run {
   // What must hold whatever failed.
   void expect(bool good, const std::string& what);
 
+  // The one error that the operation wrote to the log, after it is over: one of these, or none
+  // if there is none here.
+  void logged(const std::vector<Line>& any);
+  bool hasLine(const std::vector<Line>& any) const;
+  const std::vector<test::LogLine>& lines() const { return written; }
+  void forgetLines() { written.clear(); }
+
   const std::string& outcome() const { return result; }
   const std::string& complaints() const { return wrong; }
 
@@ -34,6 +42,7 @@ class Run {
   bool back = false;
   std::string result;
   std::string wrong;
+  std::vector<test::LogLine> written;  // by the armed part
 };
 
 using Outcomes = std::vector<std::string>;  // a "*" at the end stands for anything
@@ -43,13 +52,15 @@ struct Operation {
   std::string name;
   std::string good;  // the outcome when nothing fails
   // The outcomes when that function fails; "memory" stands for any allocation, "several" for
-  // functions that fail together. Not listed: the outcome is the good one; for want of memory it
-  // may always be std::bad_alloc.
+  // functions that fail together, and a "+" behind a name for that function with all that follow.
+  // Not listed: the outcome is the good one; for want of memory it may always be std::bad_alloc.
   std::map<std::string, Outcomes> on;
   std::function<void(Run&)> body;
   std::function<void()> configure = nullptr;  // as root, before anything else; may be missing
-  enum class Server { kNone, kPlain, kTls } server = Server::kNone;
-  bool cold = false;  // also in processes that have done nothing before
+  // kStranger: over TLS, with a certificate of its own for another name.
+  enum class Server { kNone, kPlain, kTls, kStranger } server = Server::kNone;
+  bool cold = false;   // also in processes that have done nothing before
+  bool quiet = false;  // nothing is logged: that is for its callers
 };
 
 // What the operations work with. Made in a process of its own, so that the libraries have done

@@ -1,6 +1,8 @@
 // Every exported operation of the library, on the roads that it can take.
+#include <curl/curl.h>
 #include <json/json.h>
 #include <openssl/evp.h>
+#include <syslog.h>
 
 #include <algorithm>
 #include <memory>
@@ -29,12 +31,13 @@ const std::string kBadHeader = "std::invalid_argument: bad jwt header format!";
 const std::string kBadBody = "std::invalid_argument: bad jwt body format!";
 const std::string kBadResponse = "std::invalid_argument: parse json falied";
 const std::string kNoKey = "std::invalid_argument: kid does not exist in Azure verified kyes";
+const std::string kNotForUs = "std::invalid_argument: client ID invalid";
 const std::string kNoClaims = "std::invalid_argument: please request a id_token first.";
 const std::string kNoRSA = "QOVA::JWT::jwt_verify_failed: verify rsa signature failed";
 const std::string kNoHMAC = "QOVA::JWT::jwt_verify_failed: verify hmac signature failed";
 const std::string kNoBase64 = "QOVA::SSO::sso_op_failed: encode base64 failed.";
-const std::string kTransfer = "QOVA::SSO::sso_err_resp: *";
-const std::string kRefused = "QOVA::SSO::sso_err_resp: Couldn't connect to server";
+const std::string kTransfer = "QOVA::SSO::sso_err_resp: ";
+const std::string kRefused = kTransfer + "Couldn't connect to server";
 const std::string kNoName = "QOVA::SSO::sso_op_failed: QOVAWinsUserNameFqdn2Netbios failed.";
 // jsoncpp takes the memory of its texts from malloc, and throws this when there is none.
 const std::string kJsonMemory = "Json::RuntimeError: in Json::Value::duplicate*";
@@ -97,7 +100,8 @@ std::string profileFile(const std::string& name) {
   return R"({"sso_enable":true,"sso_profile":")" + name + "\"}";
 }
 
-void writeAzure(const std::string& discovery = "/discovery") {
+void writeAzure(const std::string& discovery = "/discovery",
+                const std::string& token = "/azure-token") {
   Json::Value file;
   file["azure_sso_enable"] = true;
   file["azure_wellknown"] = providerUrl(discovery);
@@ -105,19 +109,19 @@ void writeAzure(const std::string& discovery = "/discovery") {
   file["azure_client_secret"] = "the secret of the device";
   file["azure_tenant_id"] = "the tenant's own identifier";
   file["azure_authorization_endpoint"] = "https://login.example.com/authorize";
-  file["azure_token_endpoint"] = providerUrl("/azure-token");
+  file["azure_token_endpoint"] = providerUrl(token);
   file["azure_redirect_uri"] = "https://nas.example.com/login";
   file["azure_logout_endpoint"] = "https://login.example.com/logout";
   test::writeConfig("azure.conf", file.toStyledString());
 }
 
-void writeWebSphere() {
+void writeWebSphere(const std::string& token = "/websphere-token") {
   Json::Value file;
   file["websphere_wellknown"] = providerUrl("/discovery");
   file["websphere_client_id"] = "the device's own identifier";
   file["websphere_client_secret"] = "the secret of the device";
   file["websphere_authorization_endpoint"] = "https://login.example.com/authorize";
-  file["websphere_token_endpoint"] = providerUrl("/websphere-token");
+  file["websphere_token_endpoint"] = providerUrl(token);
   file["websphere_redirect_uri"] = "https://nas.example.com/login";
   file["websphere_logout_endpoint"] = "https://login.example.com/logout";
   test::writeConfig("websphere.conf", file.toStyledString());
@@ -141,12 +145,27 @@ void configureDisabled() {
 void configureStranger() {
   configure(profileFile("another"));
 }
-// Discovery documents that are none, or name a key set whose key has no numbers.
+// Discovery documents that are none, or name a key set whose key has no numbers, or but one.
 void configureTextForDiscovery() {
   writeAzure("/text");
 }
 void configureBareKeys() {
   writeAzure("/bare-discovery");
+}
+void configureHalfKeys() {
+  writeAzure("/half-discovery");
+}
+// A provider that hands out forged tokens.
+void configureForgedAzure() {
+  configureAzure();
+  writeAzure("/discovery", "/forged-azure-token");
+}
+void configureForgedWebSphere() {
+  configureWebSphere();
+  writeWebSphere("/forged-websphere-token");
+}
+void configureNoProfile() {
+  configure(R"({"sso_enable":true})");
 }
 void configureNothing() {
   for (const char* const name : {"profile.conf", "azure.conf", "websphere.conf"}) {
@@ -226,6 +245,15 @@ std::string kindOfRequest(const std::string& url) {
   return digest == test::md5(values["nonce"]) ? "whole" : "another digest";
 }
 
+void gaveRequest(Run& run, const std::string& url) {
+  const std::string kind = kindOfRequest(url);
+  run.gave(kind);
+  run.logged(kind != "without digest"
+                 ? std::vector<Line>()
+                 : std::vector<Line>{{LOG_ERR, "utils.cpp", "MD5 digest failed %m"},
+                                     {LOG_ERR, "utils.cpp", "calloc failed. %m"}});
+}
+
 std::string kindOfTokenRequest(const std::string& body) {
   const std::map<std::string, std::string> expected = {
       {"client_id", "the device's own identifier"},
@@ -289,7 +317,7 @@ void addRequests(std::vector<Operation>* all) {
                     const Json::Value own = parameters();
                     std::string url;
                     run.armed([&] { url = client.GetAccessTokenReqURI(own); });
-                    if (run.returned()) run.gave(kindOfRequest(url));
+                    if (run.returned()) gaveRequest(run, url);
                     run.expect(own == parameters(), "the parameters are unchanged");
                   },
                   configureAzure, Server::kNone, true});
@@ -303,25 +331,36 @@ void addRequests(std::vector<Operation>* all) {
                     run.armed([&] { client.GetAccessTokenReqURI(own); });
                   },
                   configureAzure});
-  all->push_back(
-      {Provider::name() + "::RedirectAuthEndpoint", "ok: whole", digest,
-       [](Run& run) {
-         Client client;
-         const Json::Value own = parameters();
-         const std::string text =
-             test::stdoutOf([&] { run.armed([&] { client.RedirectAuthEndpoint(own); }); });
-         run.expect(run.returned() || text.empty(), "nothing is written by a failure");
-         if (!run.returned()) return;
-         const std::string start = "Location: ";
-         const bool framed = text.compare(0, start.size(), start) == 0 && text.size() > 2 &&
-                             text.substr(text.size() - 2) == "\n\n";
-         if (framed) {
-           run.gave(kindOfRequest(text.substr(start.size(), text.size() - 2 - start.size())));
-         } else {
-           run.gave("another text: " + text);
-         }
-       },
-       configureAzure});
+  all->push_back({Provider::name() + "::RedirectAuthEndpoint", "ok: whole", digest,
+                  [](Run& run) {
+                    Client client;
+                    const Json::Value own = parameters();
+                    const std::string text = test::stdoutOf(
+                        [&] { run.armed([&] { client.RedirectAuthEndpoint(own); }); });
+                    run.expect(run.returned() || text.empty(), "nothing is written by a failure");
+                    if (!run.returned()) return;
+                    const std::string start = "Location: ";
+                    const bool framed = text.compare(0, start.size(), start) == 0 &&
+                                        text.size() > 2 && text.substr(text.size() - 2) == "\n\n";
+                    if (framed) {
+                      gaveRequest(run, text.substr(start.size(), text.size() - 2 - start.size()));
+                    } else {
+                      run.gave("another text: " + text);
+                    }
+                  },
+                  configureAzure});
+  all->push_back({Provider::name() + "::RedirectAuthEndpoint, too long a state",
+                  kNoBase64,
+                  {{"memory", {kJsonMemory}}},
+                  [](Run& run) {
+                    Client client;
+                    Json::Value own = parameters();
+                    own["more"] = std::string(1000, 'x');
+                    const std::string text = test::stdoutOf(
+                        [&] { run.armed([&] { client.RedirectAuthEndpoint(own); }); });
+                    run.expect(text.empty(), "nothing is written");
+                  },
+                  configureAzure});
   all->push_back({Provider::name() + "::GetIDTokenReqParams",
                   "ok: whole",
                   {},
@@ -434,6 +473,9 @@ void addTokens(std::vector<Operation>* all) {
 void addAzure(std::vector<Operation>* all) {
   addResponse<Azure>(all, ", an error", R"({"error":"x"})",
                      "QOVA::SSO::sso_err_resp: {\"error\":\"x\"}\n", "");
+  all->push_back(
+      userName<Azure>(", an email address", fixtures()["email token"], "ok: " + Azure::user(),
+                      decoding(kBadBody) + Failures{{"QOVAWinsUserNameFqdn2Netbios", {kNoName}}}));
   all->push_back(userName<Azure>(", two at signs", fixtures()["two signs token"],
                                  "std::invalid_argument: cannot get the user name!",
                                  decoding(kBadBody)));
@@ -454,6 +496,11 @@ void addAzure(std::vector<Operation>* all) {
   add(", a key without numbers", Azure::token(),
       "std::invalid_argument: RSA public 'n' cannot be found!", keys, Server::kPlain,
       configureBareKeys);
+  add(", a key without exponent", Azure::token(),
+      "std::invalid_argument: RSA public 'e' cannot be found!", keys, Server::kPlain,
+      configureHalfKeys);
+  add(", another client's token", fixtures()["another audience token"], kNotForUs, segments,
+      Server::kNone);
   add("", Azure::token(), "ok", keys + rsa(), Server::kPlain);
   add(", a forged token", fixtures()["forged token"], kNoRSA, keys + rsa(), Server::kPlain);
   add(", an unknown key", fixtures()["stranger's token"], kNoKey, segments, Server::kPlain);
@@ -465,18 +512,31 @@ void addAzure(std::vector<Operation>* all) {
 
   const auto keySet = [&](const std::string& road, const std::string& path, const std::string& good,
                           const Failures& failures, Server server) {
-    all->push_back(
-        {"AzureSSOClient::RequestKeysInfo" + road, good, failures,
-         [path](Run& run) {
-           AzureSSOClient client;
-           Json::Value set = "before";
-           std::string url = providerUrl(path);
-           run.armed([&] { client.RequestKeysInfo(std::move(url), set); });
-           if (run.returned()) {
-             run.gave(set.isNull() ? "null" : set.isMember("keys") ? "the keys" : "no keys");
-           }
-         },
-         configureAzure, server});
+    all->push_back({"AzureSSOClient::RequestKeysInfo" + road, good, failures,
+                    [path](Run& run) {
+                      AzureSSOClient client;
+                      Json::Value set = "before";
+                      std::string url = providerUrl(path);
+                      run.armed([&] { client.RequestKeysInfo(std::move(url), set); });
+                      if (run.returned()) {
+                        const bool whole = set.isObject() && set["keys"].isArray() &&
+                                           set["keys"].size() == 1 &&
+                                           set["keys"][0]["kid"] == "the key of this year";
+                        run.gave(set.isNull() ? "null" : whole ? "the keys" : "no keys");
+                        if (whole) {
+                          run.logged({});
+                        } else if (set.isNull()) {
+                          run.logged({{LOG_ERR, "azuresso.cpp", "curl_easy_init failed. %m"},
+                                      {LOG_ERR, "azuresso.cpp",
+                                       "request wellknown uri bad wellknown json format.."},
+                                      {LOG_ERR, "azuresso.cpp", "request wellknown uri %t."}});
+                        } else {
+                          run.logged({{LOG_ERR, "azuresso.cpp", "no kyes information"},
+                                      {LOG_ERR, "azuresso.cpp", "curl_easy_init failed. %m"}});
+                        }
+                      }
+                    },
+                    configureAzure, server});
   };
   keySet("", "/keys", "ok: the keys", transfer({"ok: null"}), Server::kPlain);
   keySet(", no keys", "/discovery", "ok: no keys", transfer({"ok: null"}), Server::kPlain);
@@ -491,6 +551,8 @@ void addWebSphere(std::vector<Operation>* all) {
       verification<WebSphere>("", WebSphere::token(), "ok", segments + encoding + hmac(), true));
   all->push_back(verification<WebSphere>(", a forged token", fixtures()["forged HS256 token"],
                                          kNoHMAC, segments + encoding + hmac()));
+  all->push_back(verification<WebSphere>(
+      ", another client's token", fixtures()["another audience HS256 token"], kNotForUs, segments));
   all->push_back(verification<WebSphere>(
       ", RS256", Azure::token(), "QOVA::JWT::jwt_not_support: RS256 algorithm is not supported",
       segments));
@@ -623,7 +685,15 @@ void addHelpers(std::vector<Operation>* all) {
                     std::string own = text;
                     std::string result;
                     run.armed([&] { result = MD5Digest(std::move(own)); });
-                    if (run.returned()) run.gave(result);
+                    if (!run.returned()) return;
+                    run.gave(result);
+                    if (!result.empty()) {
+                      run.logged({});
+                    } else if (std::string(seen().name) == "calloc") {  // the library's own alone
+                      run.logged({{LOG_ERR, "utils.cpp", "calloc failed. Cannot allocate memory"}});
+                    } else {
+                      run.logged({{LOG_ERR, "utils.cpp", "MD5 digest failed %m"}});
+                    }
                   }});
 }
 
@@ -689,12 +759,34 @@ unsigned append(void* data, unsigned size, unsigned count, void* text) {
 }
 
 void addTransfers(std::vector<Operation>* all) {
-  Failures failures = transfer({kTransfer});
-  failures["curl_easy_init"] = {kBadAlloc};
-  const auto add = [&](const std::string& road, const std::string& path, const std::string& good,
-                       Server server, bool verify) {
-    const auto body = [path, verify](Run& run, bool post) {
-      const std::string url = providerUrl(path);
+  const auto text = [](CURLcode code) { return kTransfer + curl_easy_strerror(code); };
+  const Outcomes no_memory = {text(CURLE_OUT_OF_MEMORY)};
+  // Exhausted memory reaches libcurl in any of its parts.
+  Outcomes parts;
+  for (const CURLcode code : {CURLE_OUT_OF_MEMORY, CURLE_URL_MALFORMAT, CURLE_COULDNT_RESOLVE_HOST,
+                              CURLE_COULDNT_CONNECT, CURLE_WRITE_ERROR, CURLE_SSL_CONNECT_ERROR,
+                              CURLE_SEND_ERROR, CURLE_RECV_ERROR, CURLE_PEER_FAILED_VERIFICATION}) {
+    parts.push_back(text(code));
+  }
+  const Failures failures = {{"memory", parts},
+                             {"curl_global_init+", {kBadAlloc}},
+                             {"curl_easy_init", {kBadAlloc}},
+                             {"curl_easy_init+", {kBadAlloc}},
+                             {"curl_easy_setopt URL", {text(CURLE_URL_MALFORMAT)}},
+                             {"curl_easy_setopt URL+", no_memory},
+                             {"curl_easy_setopt POSTFIELDS+", no_memory},
+                             {"curl_easy_setopt SSL_VERIFYHOST+", no_memory},
+                             {"curl_easy_setopt SSL_VERIFYPEER+", no_memory},
+                             {"curl_easy_perform", no_memory},
+                             {"curl_easy_perform+", no_memory}};
+  const std::string got = "before plain text of some length";
+  const std::string posted = "before plain text about what was posted";
+  const auto add = [&](const std::string& road, Server server, bool verify, bool post,
+                       const Failures& more) {
+    const bool refused = server == Server::kNone;
+    const std::string whole = post ? posted : got;
+    const auto body = [post, verify, whole, got](Run& run) {
+      const std::string url = providerUrl("/text");
       const std::string form = "a=b";
       std::string response = "before ";
       run.armed([&] {
@@ -702,42 +794,57 @@ void addTransfers(std::vector<Operation>* all) {
              : httpGet(url, response, verify, append);
       });
       if (run.returned()) run.gave(response);
-      const std::string whole = "before plain text of some length";
-      run.expect(response.size() >= 7 && whole.compare(0, response.size(), response) == 0,
+      run.expect(response.size() >= 7 && (whole.compare(0, response.size(), response) == 0 ||
+                                          (run.returned() && response == got)),
                  "the response keeps what it held, and what arrived");
     };
-    const bool cold = server == Server::kTls || (server == Server::kPlain && road.empty());
-    all->push_back({"httpGet" + road, good, failures, [body](Run& run) { body(run, false); },
-                    nullptr, server, cold});
-    if (server == Server::kTls) return;  // nothing new
-    all->push_back({"httpPost" + road, good, failures, [body](Run& run) { body(run, true); },
-                    nullptr, server, false});
+    Operation operation = {(post ? "httpPost" : "httpGet") + road,
+                           refused ? kRefused : "ok: " + whole, failures + more, body};
+    operation.server = server;
+    operation.cold = !post && (server == Server::kTls || (!refused && road.empty()));
+    operation.quiet = true;
+    all->push_back(operation);
   };
-  add("", "/text", "ok: before plain text of some length", Server::kPlain, true);
-  add(", not verified", "/text", "ok: before plain text of some length", Server::kPlain, false);
-  add(", no provider", "/text", kRefused, Server::kNone, true);
-  add(", TLS", "/text", "ok: before plain text of some length", Server::kTls, true);
+  // A form that libcurl was not given makes the request a GET.
+  const Failures form = {{"curl_easy_setopt POSTFIELDS", {"ok: " + got}}};
+  // A check that could not be switched off refuses the stranger.
+  const Outcomes refused = {text(CURLE_PEER_FAILED_VERIFICATION)};
+  const Failures checks = {{"curl_easy_setopt SSL_VERIFYHOST", refused},
+                           {"curl_easy_setopt SSL_VERIFYPEER", refused}};
+  add("", Server::kPlain, true, false, {});
+  add("", Server::kPlain, true, true, form);
+  add(", not verified", Server::kPlain, false, false, {});
+  add(", not verified", Server::kPlain, false, true, form);
+  add(", no provider", Server::kNone, true, false, {});
+  add(", no provider", Server::kNone, true, true, {});
+  add(", TLS", Server::kTls, true, false, {});
+  add(", a stranger not verified", Server::kStranger, false, false, checks);
 }
 
 void addProviderRequests(std::vector<Operation>* all) {
   const auto discover = [&](const std::string& road, const Failures& failures,
                             const std::string& good, Server server,
                             const std::function<void()>& file) {
-    all->push_back({"SSOClient::RequestWellknownInfo" + road, good, failures,
-                    [](Run& run) {
-                      AzureSSOClient client;
-                      const std::string before = textOf(client);
-                      Json::Value document = "before";
-                      run.armed([&] { client.RequestWellknownInfo(document); });
-                      if (run.returned()) {
-                        run.gave(document.isObject() && document.isMember("jwks_uri")
-                                     ? "the document"
-                                 : document == "before" ? "before"
-                                                        : "parts of it");
-                      }
-                      run.expect(textOf(client) == before, "the client is unchanged");
-                    },
-                    file, server});
+    all->push_back(
+        {"SSOClient::RequestWellknownInfo" + road, good, failures,
+         [](Run& run) {
+           AzureSSOClient client;
+           const std::string before = textOf(client);
+           Json::Value document = "before";
+           run.armed([&] { client.RequestWellknownInfo(document); });
+           if (run.returned()) {
+             const bool whole = document.isObject() && document.size() == 1 &&
+                                document["jwks_uri"] == providerUrl("/keys");
+             run.gave(whole ? "the document" : document == "before" ? "before" : "parts of it");
+             run.logged(whole
+                            ? std::vector<Line>()
+                            : std::vector<Line>{{LOG_ERR, "sso.cpp", "bad_alloc. %m"},
+                                                {LOG_ERR, "sso.cpp", "bad wellknown json format."},
+                                                {LOG_ERR, "sso.cpp", "%t"}});
+           }
+           run.expect(textOf(client) == before, "the client is unchanged");
+         },
+         file, server});
   };
   discover("", transfer({"ok: before"}) + Failures{{"memory", {"ok: parts of it"}}},
            "ok: the document", Server::kPlain, configureAzure);
@@ -746,13 +853,21 @@ void addProviderRequests(std::vector<Operation>* all) {
            configureTextForDiscovery);
 
   const auto exchange = [&](const std::string& road, const std::string& good, Server server) {
-    all->push_back({"SSOClient::RequestTokenEndpoint" + road, good, transfer({"ok: before "}),
+    all->push_back({"SSOClient::RequestTokenEndpoint" + road, good,
+                    transfer({"ok: before "}) +
+                        Failures{{"curl_easy_setopt POSTFIELDS", {"ok: before not posted", good}}},
                     [](Run& run) {
                       WebSphereSSOClient client;
                       std::string response = "before ";
                       const std::string form = "a=b";
                       run.armed([&] { client.RequestTokenEndpoint(response, form); });
                       if (run.returned()) run.gave(response);
+                      // An answer is an answer, whatever it says.
+                      run.logged(
+                          response != "before "
+                              ? std::vector<Line>()
+                              : std::vector<Line>{{LOG_ERR, "sso.cpp", "bad_alloc. %m"},
+                                                  {LOG_ERR, "sso.cpp", "request token uri %t."}});
                     },
                     configureAzure, server});
   };
@@ -767,10 +882,11 @@ void addLogins(std::vector<Operation>* all) {
   const auto unread = [](const std::string& user) {
     return settings({kBadResponse, "ok: " + user});
   };
-  const Failures azure = segments + rsa() + transfer({kBadResponse, kNoKey}) +
+  const Failures form = {{"curl_easy_setopt POSTFIELDS", {kBadResponse}}};
+  const Failures azure = segments + rsa() + transfer({kBadResponse, kNoKey}) + form +
                          unread(Azure::user()) +
                          Failures{{"QOVAWinsUserNameFqdn2Netbios", {kNoName}}};
-  const Failures websphere = segments + hmac() + transfer({kBadResponse}) +
+  const Failures websphere = segments + hmac() + transfer({kBadResponse}) + form +
                              unread(WebSphere::user()) +
                              Failures{{"QOVABase64Encode", {kNoBase64}}};
   const std::string unreadable = "QOVA::SSO::sso_op_failed: read profile file failed.";
@@ -790,7 +906,7 @@ void addLogins(std::vector<Operation>* all) {
   const auto add = [&](const std::string& road, const std::string& good, const Failures& failures,
                        const std::function<void()>& file, Server server) {
     all->push_back({"OIDCLogin" + road, good, profile + failures, login, file, server,
-                    server == Server::kPlain});
+                    server == Server::kPlain && good.compare(0, 2, "ok") == 0});
   };
   add(", Azure", "ok: " + Azure::user(), azure, configureAzure, Server::kPlain);
   add(", WebSphere", "ok: " + WebSphere::user(), websphere, configureWebSphere, Server::kPlain);
@@ -800,6 +916,17 @@ void addLogins(std::vector<Operation>* all) {
       Server::kNone);
   add(", a stranger", "QOVA::SSO::sso_exception: profile not support.", {}, configureStranger,
       Server::kNone);
+  add(", no profile", "QOVA::SSO::sso_op_failed: not specify sso profile", {}, configureNoProfile,
+      Server::kNone);
+  add(", a broken file", unreadable, {}, configureBroken, Server::kNone);
+  // Whatever fails on the way, a forged token signs nobody in.
+  add(", Azure, a forged token", kNoRSA,
+      segments + rsa() + transfer({kBadResponse, kNoKey}) + form + settings({kBadResponse, kNoRSA}),
+      configureForgedAzure, Server::kPlain);
+  add(", WebSphere, a forged token", kNoHMAC,
+      segments + hmac() + transfer({kBadResponse}) + form + settings({kBadResponse, kNoHMAC}) +
+          Failures{{"QOVABase64Encode", {kNoBase64}}},
+      configureForgedWebSphere, Server::kPlain);
 
   const auto sequence = [&](const std::string& name, const std::string& good,
                             const Failures& failures, const auto& make) {
@@ -813,10 +940,14 @@ void addLogins(std::vector<Operation>* all) {
                     },
                     configureAzure, Server::kPlain});
   };
-  sequence(
-      "WebSphere", "ok: " + WebSphere::user(),
-      segments + hmac() + transfer({kBadResponse}) + Failures{{"QOVABase64Encode", {kNoBase64}}},
-      [] { return std::make_unique<WebSphereSSOClient>(); });
+  sequence("WebSphere", "ok: " + WebSphere::user(),
+           segments + hmac() + transfer({kBadResponse}) + form +
+               Failures{{"QOVABase64Encode", {kNoBase64}}},
+           [] { return std::make_unique<WebSphereSSOClient>(); });
+  sequence("Azure", "ok: " + Azure::user(),
+           segments + rsa() + transfer({kBadResponse, kNoKey}) + form +
+               Failures{{"QOVAWinsUserNameFqdn2Netbios", {kNoName}}},
+           [] { return std::make_unique<AzureSSOClient>(); });
   all->push_back({"SSOClient::OpenIDConnectLogin",
                   "QOVA::SSO::sso_not_implemented: GetIDTokenReqParams not implemented",
                   {},
