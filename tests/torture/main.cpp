@@ -3,7 +3,7 @@
 // nothing was kept (memory, descriptors), the process ids are what the guard leaves, and the
 // system log holds the library's own lines alone. Operations are run in processes of their own.
 //   torture_test [--every N] [--fresh N] [--measured] [NAME...]
-// NAME limits it to operations that begin so; --every N takes every N-th injection of those that
+// NAME limits it to operations that begin so; --every N takes every N-th allocation of those that
 // talk TLS, --fresh N of those in fresh processes. --measured: the library carries a run time of
 // the compiler's that measures, with imports of its own.
 #include <curl/curl.h>
@@ -254,7 +254,8 @@ bool leaks(const Operation& operation, const Plan& plan) {
 bool advance(const Operation& operation, bool hit, Plan* plan) {
   const bool tls = operation.server == Operation::Server::kTls ||
                    operation.server == Operation::Server::kStranger;
-  const long step = report->cold ? everyFresh : tls ? every : 1;
+  const bool many = tls && plan->kind == Kind::kMemory;
+  const long step = report->cold ? everyFresh : many ? every : 1;
   plan->nth += step;
   if (hit) return true;
   plan->nth = 1;
