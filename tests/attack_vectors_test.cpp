@@ -210,6 +210,61 @@ TEST(VectorsOfRfc4231, ForHmacVerify) {
   }
 }
 
+// RFC 7518, appendix B.1 to B.3: the MACs of its composite encryptions, over the text beside, the
+// initial vector, the ciphertext, and the bits of the first. (Its appendix A names algorithms, C is
+// of a key agreement.)
+struct Composite {
+  const char* source;
+  const EVP_MD* (*md)();
+  size_t keySize;  // the key is 00 01 02 ...
+  const char* ciphertext;
+  const char* mac;
+};
+
+const std::vector<Composite> kComposites = {
+    {"appendix B.1", EVP_sha256, 16,
+     "c80edfa32ddf39d5ef00c0b468834279a2e46a1b8049f792f76bfe54b903a9c9a94ac9b47ad2655c5f10f9ae"
+     "f71427e2fc6f9b3f399a221489f16362c703233609d45ac69864e3321cf82935ac4096c86e133314c54019e8"
+     "ca7980dfa4b9cf1b384c486f3a54c51078158ee5d79de59fbd34d848b3d69550a67646344427ade54b8851ff"
+     "b598f7f80074b9473c82e2db",
+     "652c3fa36b0a7c5b3219fab3a30bc1c4e6e54582476515f0ad9f75a2b71c73ef"},
+    {"appendix B.2", EVP_sha384, 24,
+     "ea65da6b59e61edb419be62d19712ae5d303eeb50052d0dfd6697f77224c8edb000d279bdc14c1072654bd30"
+     "944230c657bed4ca0c9f4a8466f22b226d1746214bf8cfc2400add9f5126e479663fc90b3bed787a2f0ffcbf"
+     "3904be2a641d5c2105bfe591bae23b1d7449e532eef60a9ac8bb6c6b01d35d49787bcd57ef484927f280adc9"
+     "1ac0c4e79c7b11efc60054e3",
+     "8490ac0e58949bfe51875d733f93ac2075168039ccc733d74594f886b3faafd486f25c7131e3281e36c7a2d1"
+     "30afde57"},
+    {"appendix B.3", EVP_sha512, 32,
+     "4affaaadb78c31c5da4b1b590d10ffbd3dd8d5d302423526912da037ecbcc7bd822c301dd67c373bccb584ad"
+     "3e9279c2e6d12a1374b77f077553df829410446b36ebd97066296ae6427ea75c2e0846a11a09ccf5370dc80b"
+     "fecbad28c73f09b3a3b75e662a2594410ae496b2e2e6609e31e6e02cc837f053d21f37ff4f51950bbe2638d0"
+     "9dd7a4930930806d0703b1f6",
+     "4dd3b4c088a7f45c216839645b2012bf2e6269a8c56a816dbc1b267761955bc5fd30a565c616ffb2f364baec"
+     "e68fc40753bcfc025dde3693754aa1f5c3373b9c"},
+};
+
+TEST(VectorsOfRfc7518, ForHmacVerify) {
+  const std::string beside = "The second principle of Auguste Kerckhoffs";
+  const std::string vector = fromHex("1af38c2dc2b96ffdd86694092341bc04");
+  Count count;
+  for (const Composite& each : kComposites) {
+    SCOPED_TRACE(each.source);
+    std::string key;
+    while (key.size() < each.keySize) key += static_cast<char>(key.size());
+    const std::string text =
+        beside + vector + fromHex(each.ciphertext) + fromHex("0000000000000150");
+    const std::string mac = fromHex(each.mac);
+    ASSERT_EQ(mac.size(), 2 * each.keySize);
+    EXPECT_TRUE(passesHmac(text, mac, key, each.md(), count));
+    EXPECT_FALSE(passesHmac(text, mac.substr(0, each.keySize), key, each.md(), count))
+        << "the half that an encryption carries";
+    EXPECT_FALSE(passesHmac(text, mac, key + 'x', each.md(), count));
+    EXPECT_FALSE(passesHmac(text + 'x', mac, key, each.md(), count));
+  }
+  EXPECT_EQ(count.accepted, 3u);
+}
+
 // A file of texts, each behind its length (the blobby format, version 0.3). A length is doubled:
 // an odd number refers to one of the texts in front, which occur more than once.
 class Texts {
@@ -340,7 +395,12 @@ const std::vector<Foreign> kForeign = {
     {"RFC 7520, section 4.3", "ES512",
      "eyJhbGciOiJFUzUxMiIsImtpZCI6ImJpbGJvLmJhZ2dpbnNAaG9iYml0b24uZXhhbXBsZSJ9",
      "AE_R_YZCChjn4791jSQCrdPZCNYqHXCTZH0-JZGYNlaAjP2kqaluUIIUnC9qvbu9Plon7KRTzoNEuT4Va2cmL1eJAQy3"
-     "mtPBu_u_sDDyYjnAMDxXPn7XrT0lw-kvAD890jl8e2puQens_IEKBpHABlsbEPX6sFY8OcGDqoRuBomu9xQ2"}};
+     "mtPBu_u_sDDyYjnAMDxXPn7XrT0lw-kvAD890jl8e2puQens_IEKBpHABlsbEPX6sFY8OcGDqoRuBomu9xQ2"},
+    {"RFC 7515, appendix A.4", "ES512", "eyJhbGciOiJFUzUxMiJ9",
+     "AdwMgeerwtHoh-l192l60hp9wAHZFVJbLfD_UxMi70cwnZOYaRI1bKPWROc-mZZqwqT2SI-KGDKB34XO0aw_7XdtAG8G"
+     "aSwFKdCAPZgoXD2YBJZCPEX3xKpRwcdOO8KpEHwJjyqOgzDO7iKvU8vcnwNrmxYbSW9ERBXukOXolLzeO_Jn"}};
+
+const char kPayload[] = "UGF5bG9hZA";  // of RFC 7515, appendix A.4: "Payload"
 
 // RSASSA-PSS under the right key: not one of the algorithms, and not their padding either.
 const char kBilbo[] =
@@ -425,6 +485,8 @@ TYPED_TEST(ExamplesForBoth, OfOtherAlgorithmsAreNotSupported) {
         "id_token expired.", example.header + "." + kJoe + "." + example.signature));
     EXPECT_TRUE(this->template refuses<std::invalid_argument>(
         "bad jwt body format!", example.header + "." + kFrodo + "." + example.signature));
+    EXPECT_TRUE(this->template refuses<std::invalid_argument>(
+        "bad jwt body format!", example.header + "." + kPayload + "." + example.signature));
     EXPECT_TRUE(this->template refuses<jwt_not_support>(
         std::string(example.algorithm) + " algorithm is not supported",
         example.header + "." + never + "." + example.signature));

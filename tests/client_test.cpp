@@ -11,6 +11,7 @@
 #include "sso/sso.h"
 #include "sso/webspheresso.h"
 #include "support/log.h"
+#include "support/memory_spy.h"
 #include "support/throws.h"
 
 namespace {
@@ -242,13 +243,41 @@ TEST(DispatchTable, LeadsToTheOperationsThemselves) {
   EXPECT_TRUE(reinterpret_cast<Flag>(tableOf(&client)[0])(&client));
 }
 
-// The destructors follow the operations: the second one also frees the object.
+// The memory of a client's redirect URI.
+struct RedirectUri : SSOClient {
+  static const void* memoryOf(const SSOClient* client) {
+    return (client->*&RedirectUri::redirectURI).data();
+  }
+};
+
+// The destructors follow the operations: the first one leaves the object's own memory, the second
+// one gives that back too.
+template <typename Client>
+void expectDestroyedThroughItsSlots() {
+  using Destructor = void (*)(void*);
+  const std::string uri(1000, 'u');
+  for (const bool frees : {false, true}) {
+    SCOPED_TRACE(frees);
+    void* const memory = ::operator new(sizeof(Client));
+    auto* const client = new (memory) Client;
+    client->SetRedirectURI(uri);
+    const Destructor destructor = reinterpret_cast<Destructor>(tableOf(client)[frees ? 19 : 18]);
+    const test::Watched text(RedirectUri::memoryOf(client));
+    const test::Watched object(memory);
+    destructor(client);
+    EXPECT_EQ(text.deletions(), 1);
+    EXPECT_EQ(object.deletions(), frees ? 1 : 0);
+    if (!frees) ::operator delete(memory);
+  }
+}
+
 TEST(DispatchTable, ProvidersAreDestroyedThroughTheirOwnLastSlots) {
-  auto* const azure = new AzureSSOClient;
-  auto* const websphere = new WebSphereSSOClient;
-  using Delete = void (*)(void*);
-  reinterpret_cast<Delete>(tableOf(azure)[19])(azure);
-  reinterpret_cast<Delete>(tableOf(websphere)[19])(websphere);
+  expectDestroyedThroughItsSlots<AzureSSOClient>();
+  expectDestroyedThroughItsSlots<WebSphereSSOClient>();
+  const AzureSSOClient azure;
+  const WebSphereSSOClient websphere;
+  for (const std::size_t slot : {18u, 19u})
+    EXPECT_NE(tableOf(&azure)[slot], tableOf(&websphere)[slot]) << "slot " << slot + 1;
 }
 
 }  // namespace

@@ -14,6 +14,19 @@ namespace {
 std::size_t untilNew = 0;
 bool failed = false;
 
+struct Watch {
+  const void* memory;
+  int deletions;
+};
+Watch watches[2];
+
+void release(void* memory) {
+  for (Watch& each : watches) {
+    if (memory != nullptr && each.memory == memory) ++each.deletions;
+  }
+  std::free(memory);
+}
+
 std::size_t failingBytes = 0;
 std::size_t failures = 0;
 
@@ -47,22 +60,22 @@ void* operator new[](std::size_t size, const std::nothrow_t&) noexcept {
   return allocate(size);
 }
 void operator delete(void* memory) noexcept {
-  std::free(memory);
+  release(memory);
 }
 void operator delete[](void* memory) noexcept {
-  std::free(memory);
+  release(memory);
 }
 void operator delete(void* memory, std::size_t) noexcept {
-  std::free(memory);
+  release(memory);
 }
 void operator delete[](void* memory, std::size_t) noexcept {
-  std::free(memory);
+  release(memory);
 }
 void operator delete(void* memory, const std::nothrow_t&) noexcept {
-  std::free(memory);
+  release(memory);
 }
 void operator delete[](void* memory, const std::nothrow_t&) noexcept {
-  std::free(memory);
+  release(memory);
 }
 
 // Zero-filled memory from malloc: asking the dynamic linker for the real calloc would end up here
@@ -86,6 +99,16 @@ extern "C" __attribute__((visibility("default"))) void* calloc(std::size_t count
 }
 
 namespace test {
+
+Watched::Watched(const void* memory) : slot(watches[0].memory == nullptr ? 0 : 1) {
+  watches[slot] = {memory, 0};
+}
+Watched::~Watched() {
+  watches[slot] = {nullptr, 0};
+}
+int Watched::deletions() const {
+  return watches[slot].deletions;
+}
 
 void failNew(std::size_t nth) {
   untilNew = nth;

@@ -1,4 +1,5 @@
-// Lets an allocation fail. Link support/memory_spy.cpp into the test program that needs it.
+// Lets an allocation fail, and sees memory given back. Link support/memory_spy.cpp into the test
+// program that needs it.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -32,6 +33,20 @@ int failEachNew(const Operation& operation) {
   }
   return -1;
 }
+
+// While it lives, counts how often operator delete is given this memory. One at a time, or two.
+class Watched {
+ public:
+  explicit Watched(const void* memory);
+  ~Watched();
+  Watched(const Watched&) = delete;
+  Watched& operator=(const Watched&) = delete;
+
+  int deletions() const;
+
+ private:
+  int slot;
+};
 
 // While it lives, calloc of exactly so many bytes (count times size) gives null, errno ENOMEM.
 class FailingCalloc {
