@@ -138,6 +138,13 @@ void checkLog(const Operation& operation, const Plan& plan, const Seen& what, Ru
     run->expect(isOwn(line), "a strange line in the log: " + line.text);
   }
   if (operation.quiet) run->expect(run->lines().empty(), "the log is for the callers");
+  // Keys that a failure kept away were asked for, and the fetch that failed was logged.
+  const std::string no_key = "std::invalid_argument: kid does not exist in Azure verified kyes";
+  const bool kept_away = run->outcome() == no_key && operation.good != no_key;
+  run->expect(
+      !kept_away || std::any_of(run->lines().begin(), run->lines().end(),
+                                [](const test::LogLine& line) { return line.priority == LOG_ERR; }),
+      "the log does not say why there are no keys");
   if (!what.hit || plan.kind == Kind::kMemory || operation.quiet) return;
   if (what.idsChange != 0) checkGuardLines(what, run);
   const std::vector<Line> wanted = calledFor(what.name, plan.allAfter);
