@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdio>
 #include <memory>
 #include <ostream>
@@ -14,7 +15,17 @@
 
 #include "support/clients.h"
 #include "support/device.h"
+#include "support/faults.h"
 #include "support/log.h"
+
+// A signal comes before the first byte.
+extern "C" ssize_t read(int file, void* bytes, size_t size) {
+  static auto* const next =
+      reinterpret_cast<ssize_t (*)(int, void*, size_t)>(dlsym(RTLD_NEXT, "read"));
+  if (!test::failsNow("read", __builtin_return_address(0))) return next(file, bytes, size);
+  errno = EINTR;
+  return -1;
+}
 
 namespace {
 
@@ -59,6 +70,15 @@ TYPED_TEST(ClientConfig, TakesEverySettingFromItsKey) {
   for (const Setting& setting : this->Settings())
     EXPECT_EQ((client.*setting.get)(), setting.key) << setting.key;
   EXPECT_EQ(client.GetToken(), "");
+}
+
+TYPED_TEST(ClientConfig, IsReadOnAfterAnInterruption) {
+  writeConfig(this->File(), this->Everything().toStyledString());
+  const test::Fault interruption("read");
+  typename TypeParam::Client client;
+  EXPECT_TRUE(interruption.wasHit());
+  for (const Setting& setting : this->Settings())
+    EXPECT_EQ((client.*setting.get)(), setting.key) << setting.key;
 }
 
 // The number that the next file to be opened gets.

@@ -30,6 +30,7 @@ std::vector<size_t> reads;
 bool limited = false;
 ssize_t limit = 0;
 bool no_getrandom = false;
+int interruptions = 0;  // of getrandom, to come
 
 template <typename Function>
 Function* Next(const char* name) {
@@ -85,9 +86,10 @@ extern "C" unsigned char* MD5(const unsigned char* bytes, size_t size, unsigned 
 
 extern "C" ssize_t getrandom(void* bytes, size_t size, unsigned flags) {
   static auto* const next = Next<ssize_t(void*, size_t, unsigned)>("getrandom");
-  if (!no_getrandom || !test::isFromLibrary(__builtin_return_address(0)))
-    return next(bytes, size, flags);
-  errno = ENOSYS;
+  const bool ours = test::isFromLibrary(__builtin_return_address(0));
+  if (!ours || (!no_getrandom && interruptions == 0)) return next(bytes, size, flags);
+  errno = no_getrandom ? ENOSYS : EINTR;
+  if (interruptions > 0) --interruptions;
   return -1;
 }
 
@@ -111,6 +113,7 @@ class ClientNonce : public testing::Test {
     opened = closed = 0;
     reads.clear();
     limited = no_getrandom = false;
+    interruptions = 0;
   }
 
   void TearDown() override {
@@ -148,6 +151,14 @@ TYPED_TEST(ClientNonce, IsRandomWhenTheDeviceCannotBeRead) {
     SCOPED_TRACE(count);
     this->ExpectDifferentNonces();
   }
+}
+
+TYPED_TEST(ClientNonce, IsRandomWhenTheKernelIsInterrupted) {
+  limited = true;
+  limit = -1;
+  interruptions = 3;
+  this->ExpectDifferentNonces();
+  EXPECT_EQ(interruptions, 0);
 }
 
 TYPED_TEST(ClientNonce, IsMadeWithoutAnySourceOfRandomness) {
