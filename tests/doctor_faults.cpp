@@ -368,8 +368,8 @@ std::vector<SeededFault> networkFaults() {
   const auto silent = [](const char* path) {
     return [path](Site& site) {
       site.probeAnswers[path] = ok("{}");
-      site.probeAnswers[path].delayMs = 4000;
-      site.arguments = {"--timeout", "1"};
+      site.probeAnswers[path].delayMs = 20000;
+      site.arguments = {"--timeout", "5"};
     };
   };
   const auto connectElsewhere = [](Site& s) {
