@@ -305,6 +305,13 @@ void addConstruction(std::vector<Operation>* all) {
   all->push_back({name + ", a broken file", "ok: nothing", {}, body, configureBroken});
 }
 
+// Parameters whose state is longer than the device encodes.
+Json::Value tooMuch() {
+  Json::Value value = parameters();
+  value["more"] = std::string(1000, 'x');
+  return value;
+}
+
 template <typename Provider>
 void addRequests(std::vector<Operation>* all) {
   using Client = typename Provider::Client;
@@ -326,8 +333,7 @@ void addRequests(std::vector<Operation>* all) {
                   {{"memory", {kJsonMemory}}},
                   [](Run& run) {
                     Client client;
-                    Json::Value own = parameters();
-                    own["more"] = std::string(1000, 'x');
+                    const Json::Value own = tooMuch();
                     run.armed([&] { client.GetAccessTokenReqURI(own); });
                   },
                   configureAzure});
@@ -354,8 +360,7 @@ void addRequests(std::vector<Operation>* all) {
                   {{"memory", {kJsonMemory}}},
                   [](Run& run) {
                     Client client;
-                    Json::Value own = parameters();
-                    own["more"] = std::string(1000, 'x');
+                    const Json::Value own = tooMuch();
                     const std::string text = test::stdoutOf(
                         [&] { run.armed([&] { client.RedirectAuthEndpoint(own); }); });
                     run.expect(text.empty(), "nothing is written");
