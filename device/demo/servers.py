@@ -159,6 +159,7 @@ http {{
       fastcgi_param CONTENT_TYPE $content_type;
       fastcgi_param CONTENT_LENGTH $content_length;
       fastcgi_param SERVER_PROTOCOL $server_protocol;
+      fastcgi_param REMOTE_ADDR $remote_addr;
       {environment}
     }}
   }}

@@ -3,9 +3,11 @@
 
 #include "cgi.h"
 #include "session.h"
+#include "settings.h"
 
 int main() {
-  const std::string user = session::User(cgi::ReadRequest());
+  const std::optional<Session> session = session::Current(cgi::ReadRequest(), ReadSettings());
+  const std::string user = session ? session->user : "";
   std::cout << "Status: 200 OK\n"
                "Content-Type: text/html; charset=utf-8\n"
                "Cache-Control: no-store\n"
@@ -25,6 +27,9 @@ int main() {
     std::cout << "<p>Signed in as <strong id=\"user\">" << cgi::EscapeHTML(user)
               << "</strong>.</p>\n"
                  "<form id=\"sign-out\" method=\"post\" action=\"/webman/login.cgi?action=logout\">"
+                 "<input type=\"hidden\" name=\"token\" value=\""
+              << session->token
+              << "\">"
                  "<button class=\"button\">Sign out</button></form>\n";
   }
   std::cout << "</main>\n</body>\n</html>\n";
