@@ -1,10 +1,12 @@
 """The device under test: its programs, one web server, and the scripted provider."""
 
+import contextlib
 import json
 import os
 import secrets
 import subprocess
 import sys
+import threading
 import time
 import unittest
 import urllib.parse
@@ -21,6 +23,8 @@ from stage import WWW, Stage  # noqa: E402
 EXPECTED = {"azure": "PLANT7.EXAMPLE.NET\\alice", "websphere": "alice"}
 STORE = "/run/ssoclient"
 LOGIN = WWW + "/webman/login.cgi"
+LIBEXEC = "/usr/qova/libexec/ssoclient-login"
+BUILD = os.environ["SSOCLIENT_BUILD"]
 
 
 class Device:
@@ -29,8 +33,7 @@ class Device:
     def __init__(self):
         self.stage = Stage(DEVICE, PROVIDER, 8443, 8444)
         self.stage.build()
-        build = os.environ["SSOCLIENT_BUILD"]
-        self.stage.install(build + "/prefix", build + "/device", HERE + "/../www")
+        self.stage.install(BUILD + "/prefix", BUILD + "/device", HERE + "/../www")
         self.person = Person("alice", secrets.token_urlsafe(9), "alice@plant7.example.net", {
             "tid": "tenant-7", "unique_name": "alice@plant7.example.net"})
         self.provider = Scripted(self.stage, self.person)
@@ -97,6 +100,56 @@ def device():
     return _device
 
 
+def programs(program="login.cgi"):
+    """Process ids of the login programs that run, parents before children."""
+    found = []
+    for name in os.listdir("/proc"):
+        if not name.isdigit():
+            continue
+        try:
+            with open(f"/proc/{name}/stat", encoding="ascii") as file:
+                stat = file.read()
+        except OSError:
+            continue
+        if f"({program})" in stat and stat.split()[2] != "Z":
+            found.append(int(name))
+    return sorted(found)
+
+
+def wait_until(condition, seconds=15):
+    end = time.monotonic() + seconds
+    while not condition():
+        if time.monotonic() > end:
+            raise AssertionError("waited in vain")
+        time.sleep(0.05)
+
+
+class SetId:
+    """The login program is set-id itself."""
+
+    program = "login.cgi"
+
+
+class Launched:
+    """The other way to the same identities: the launcher is set-id, the login program is not."""
+
+    program = "ssoclient-login"
+
+    @classmethod
+    def setUpClass(cls):
+        super().setUpClass()
+        cls.stage = device().stage
+        os.makedirs(os.path.dirname(LIBEXEC), exist_ok=True)
+        cls.stage.install_login(BUILD + "/device/login.cgi", LIBEXEC, 0o750)
+        cls.stage.install_login(BUILD + "/device/launcher.cgi", LOGIN, 0o4750)
+
+    @classmethod
+    def tearDownClass(cls):
+        os.unlink(LIBEXEC)
+        cls.stage.install_login(BUILD + "/device/login.cgi", LOGIN, 0o4750)
+        super().tearDownClass()
+
+
 def values_of(url):
     parts = urllib.parse.urlsplit(url)
     return dict(urllib.parse.parse_qsl(parts.query or parts.fragment))
@@ -106,6 +159,7 @@ class DeviceTest(unittest.TestCase):
     """A test with a fresh browser and a provider that behaves."""
 
     longMessage = True
+    program = SetId.program
 
     def setUp(self):
         self.device = device()
@@ -158,6 +212,24 @@ class DeviceTest(unittest.TestCase):
             timeout=timeout, check=False, user=user, group=user, extra_groups=[], preexec_fn=before,
             env={"REQUEST_METHOD": "GET", "QUERY_STRING": query, "HTTP_COOKIE": cookie,
                  "SCRIPT_NAME": "/webman/login.cgi", **variables})
+
+    @contextlib.contextmanager
+    def exchanging(self, url):
+        """A callback whose exchange waits for the provider; gives the ids of the two processes."""
+        self.device.provider.script = Script(silent=("token",))
+        before = len(self.device.provider.seen)
+        waiting = threading.Thread(target=self.browser.get, args=(url,))
+        waiting.start()
+        try:
+            wait_until(lambda: any(path.endswith("/token")
+                                   for _, path, _, _ in self.device.provider.seen[before:]))
+            running = programs(self.program)
+            self.assertEqual(len(running), 2)
+            yield running
+        finally:
+            self.device.provider.release()
+            waiting.join(30)
+        wait_until(lambda: not programs(self.program))
 
     # -- outcomes --------------------------------------------------------------------------
 

@@ -12,7 +12,7 @@ import time
 import unittest
 import urllib.parse
 
-from device import EXPECTED, LOGIN, STORE, DeviceTest, device, values_of
+from device import EXPECTED, LIBEXEC, LOGIN, STORE, DeviceTest, Launched, values_of
 from providers.scripted import Script
 from servers import Apache, Busybox, Lighttpd, Nginx
 
@@ -738,27 +738,7 @@ class Identity(DeviceTest):
             self.run_program("action=start", user=65534)
 
 
-class Launched(DeviceTest):
-    """The other way to the same identities: the launcher is set-id, the login program is not."""
-
-    PROGRAM = "/usr/qova/libexec/ssoclient-login"
-    BAIT = {"LD_PRELOAD": "/nowhere.so", "BASH_ENV": "/nowhere", "HTTP_PROXY": "http://evil:1"}
-
-    @classmethod
-    def setUpClass(cls):
-        build = os.environ["SSOCLIENT_BUILD"] + "/device/"
-        cls.stage = device().stage
-        os.makedirs(os.path.dirname(cls.PROGRAM), exist_ok=True)
-        cls.stage.install_login(build + "login.cgi", cls.PROGRAM, 0o750)
-        cls.stage.install_login(build + "launcher.cgi", LOGIN, 0o4750)
-        device().use(Lighttpd, **cls.BAIT)
-
-    @classmethod
-    def tearDownClass(cls):
-        os.unlink(cls.PROGRAM)
-        cls.stage.install_login(os.environ["SSOCLIENT_BUILD"] + "/device/login.cgi", LOGIN, 0o4750)
-        device().use(Lighttpd)
-
+class ThroughTheLauncher(Launched, DeviceTest):
     def test_signs_in_and_out(self):
         for profile in ("azure", "websphere"):
             with self.subTest(profile=profile):
@@ -768,7 +748,7 @@ class Launched(DeviceTest):
                 self.assertIsNone(self.user())
 
     def test_under_the_other_web_servers(self):
-        self.addCleanup(self.setUpClass)
+        self.addCleanup(self.device.use, Lighttpd)
         for server in (Apache, Nginx, Busybox):
             with self.subTest(server=server.title or server.__name__):
                 self.device.use(server)
@@ -776,11 +756,11 @@ class Launched(DeviceTest):
                 self.assert_signed_in(self.sign_in(), "websphere")
 
     def test_not_through_the_launcher(self):
-        out = self.run_program("action=start", path=self.PROGRAM)
+        out = self.run_program("action=start", path=LIBEXEC)
         self.assertIn("#reason=internal.", out)
         self.assert_logged("login program is not installed set-id root")
         with self.assertRaises(PermissionError):
-            self.run_program("action=start", path=self.PROGRAM, user=65534)
+            self.run_program("action=start", path=LIBEXEC, user=65534)
 
     def refused(self, reason, **options):
         self.assertRegex(self.run_program("action=start", **options),
@@ -802,33 +782,9 @@ class Launched(DeviceTest):
             self.run_program("action=start", user=65534)
 
     def test_no_program(self):
-        os.rename(self.PROGRAM, self.PROGRAM + "-away")
-        self.addCleanup(os.rename, self.PROGRAM + "-away", self.PROGRAM)
+        os.rename(LIBEXEC, LIBEXEC + "-away")
+        self.addCleanup(os.rename, LIBEXEC + "-away", LIBEXEC)
         self.refused("login program does not start")
-
-
-def programs(program="login.cgi"):
-    """Process ids of the login programs that run, parents before children."""
-    found = []
-    for name in os.listdir("/proc"):
-        if not name.isdigit():
-            continue
-        try:
-            with open(f"/proc/{name}/stat", encoding="ascii") as file:
-                stat = file.read()
-        except OSError:
-            continue
-        if f"({program})" in stat and stat.split()[2] != "Z":
-            found.append(int(name))
-    return sorted(found)
-
-
-def wait_until(condition, seconds=15):
-    end = time.monotonic() + seconds
-    while not condition():
-        if time.monotonic() > end:
-            raise AssertionError("waited in vain")
-        time.sleep(0.05)
 
 
 if __name__ == "__main__":
