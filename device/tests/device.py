@@ -169,7 +169,7 @@ class DeviceTest(unittest.TestCase):
         self.device.options()
         self.browser = self.new_browser()
         self.addCleanup(self.device.home.release)
-        self.log_start = len(self.device.stage.log.lines)
+        self.forget_log()
 
     def new_browser(self):
         return Browser(self.device.stage.authority)
@@ -242,9 +242,13 @@ class DeviceTest(unittest.TestCase):
         return values_of(page.location)
 
     def log(self):
-        """What was logged since the test began, as soon as it is there."""
-        time.sleep(0.05)
+        """What was logged since the test began."""
+        self.device.stage.log.catch_up()
         return self.device.stage.log.lines[self.log_start:]
+
+    def forget_log(self):
+        self.device.stage.log.catch_up()
+        self.log_start = len(self.device.stage.log.lines)
 
     def logged(self, part, seconds=5):
         """The lines of the log that hold a text; waits until there is one."""
@@ -252,6 +256,7 @@ class DeviceTest(unittest.TestCase):
         lines = []
         while not lines and time.monotonic() < end:
             lines = [line for line in self.log() if part in line]
+            time.sleep(0 if lines else 0.05)
         return lines
 
     def assert_logged(self, text):

@@ -46,7 +46,7 @@ class Environment:
         self.browser = self.new_browser()
         query = urllib.parse.urlsplit(self.callback_url()).query
         cookie = self.cookie_header()["Cookie"]
-        self.log_start = len(self.device.stage.log.lines)
+        self.forget_log()
         self.traps.sprung()
         done = self.run_raw(query, cookie, **variables)
         self.assertTrue(self.logged("signed in: "), self.log())
@@ -104,7 +104,7 @@ class Control(DeviceTest):
         self.addCleanup(traps.close)
         ineffective = []
         for name in EFFECTIVE:
-            self.log_start = len(self.device.stage.log.lines)
+            self.forget_log()
             traps.sprung()
             subprocess.run([program], env=traps.value(name), stdout=subprocess.DEVNULL,
                            stderr=subprocess.DEVNULL, check=False, timeout=20)

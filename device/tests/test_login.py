@@ -2,12 +2,10 @@
 
 import base64
 import concurrent.futures
-import hashlib
 import json
 import os
 import re
 import subprocess
-import threading
 import time
 import unittest
 import urllib.parse

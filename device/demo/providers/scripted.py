@@ -44,6 +44,7 @@ class Script:
     send instead."""
     refuse: dict = None        # parameters of an error answer to the authorization request
     claims: object = None      # changes the claims of the ID token
+    raw_claims: object = None  # changes their text, in bytes
     header: object = None      # changes the header of the ID token
     signature: object = None   # changes the bytes of the signature
     sign: object = None        # signs instead of the provider's key: bytes to signature
@@ -51,6 +52,7 @@ class Script:
     document: object = None    # changes (path, status, type, body) of "wellknown" and "keys"
     silent: tuple = ()         # paths ("token", "keys"...) that take the request and do not answer
     cut: tuple = ()            # paths whose answer ends in its middle
+    flood: dict = dataclasses.field(default_factory=dict)  # per path: writes to the connection
     leave: bool = False        # nobody listens any more once a code is handed out
 
 
@@ -221,7 +223,10 @@ class Scripted:
             claims = self.script.claims(claims)
         if self.script.header is not None:
             header = self.script.header(header)
-        signed = ".".join(_base64url(json.dumps(part).encode()) for part in (header, claims))
+        parts = [json.dumps(part).encode() for part in (header, claims)]
+        if self.script.raw_claims is not None:
+            parts[1] = self.script.raw_claims(parts[1])
+        signed = ".".join(map(_base64url, parts))
         signature = (self.script.sign or realm.sign)(signed.encode())
         if self.script.signature is not None:
             signature = self.script.signature(signature)
@@ -300,6 +305,10 @@ class _Handler(http.server.BaseHTTPRequestHandler):
         if path in self.provider.script.silent:
             self.provider.hold()
             self.close_connection = True
+        elif path in self.provider.script.flood:
+            self.close_connection = True
+            with contextlib.suppress(OSError):  # whoever asked has had enough
+                self.provider.script.flood[path](self.wfile)
         elif not self.provider.known(name):
             self._send(404, {}, "")
         elif path == "authorization":
