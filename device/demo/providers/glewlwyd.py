@@ -12,6 +12,7 @@ import sqlite3
 import urllib.parse
 
 from browser import Browser, BrowserError
+from providers import BOTH
 from stage import run, write
 
 SCHEMA = "/usr/share/dbconfig-common/data/glewlwyd/install/sqlite3"
@@ -66,6 +67,7 @@ class Glewlwyd:
     title = "Glewlwyd"
     fields = "#username", "#password"  # of the login page
     comes_back = False  # after a logout: it ends on an empty page of its own
+    setups = BOTH
 
     def __init__(self, stage, person):
         self.url = f"https://{stage.provider_name}:{stage.provider_port}"

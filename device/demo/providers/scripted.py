@@ -14,6 +14,7 @@ import time
 import urllib.parse
 
 from browser import BrowserError
+from providers import BOTH
 from providers.jose import RsaKey, base64url, hmac_signer, signing_input
 from providers.web import Answer, Handler, Site, login_page, with_query
 
@@ -47,6 +48,7 @@ class Scripted(Site):
     title = "scripted provider"
     fields = "#username", "#password"  # of the login page
     comes_back = True  # after a logout
+    setups = BOTH
 
     def __init__(self, stage, person):
         super().__init__()
