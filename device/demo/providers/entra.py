@@ -98,6 +98,9 @@ class Entra(Twin):
 
     # -- keys ------------------------------------------------------------------------------
 
+    def prepare(self):
+        self._signing_keys()
+
     def _new_key(self):
         self._made_keys += 1
         return RsaKey(f"{self.folder}/entra-{self._made_keys}")
@@ -469,7 +472,9 @@ class Entra(Twin):
     def on_stage(self, stage, person):
         super().on_stage(stage, person)
         name = person.claims["unique_name"]
-        self.set(tenant_id=person.claims["tid"], upn=name, tenant_domain=name.split("@")[1])
+        # The optional claim: a token of v2.0 names the user to the device by it alone.
+        self.set(tenant_id=person.claims["tid"], upn=name, tenant_domain=name.split("@")[1],
+                 email_claim=True)
 
     @property
     def login_name(self):
@@ -477,13 +482,10 @@ class Entra(Twin):
 
     def add_v1(self, client):
         self.register(client)
-        self.set(email_claim=False)
         return self.endpoints(False)
 
     def add_v2(self, client):
-        """A token of v2.0 names the user to the device by the optional claim alone."""
         self.register(client)
-        self.set(email_claim=True)
         return self.endpoints(True)
 
     def endpoints(self, v2):

@@ -186,6 +186,10 @@ class LemonLDAP:
 
     # -- a person in front of the pages ----------------------------------------------------
 
+    @property
+    def login_name(self):
+        return self._person.account
+
     def agree(self, tab):
         """Asks nothing after name and password."""
 

@@ -94,7 +94,9 @@ class Settings(Common):
 class Liberty(Twin):
     title = "twin of WebSphere Liberty"
     fields = "input[name=j_username]", "input[name=j_password]"  # of the login page
-    comes_back = False  # after a logout: that wants an id_token_hint, which is not sent here
+    comes_back = False  # after a logout
+    goodbye = "You are logged out."
+    why_not_back = "it returns only to a client that sends an ID token, which the device does not"
     settings_class = Settings
     session_cookie = "LtpaToken2"
     setups = {"websphere": ("websphere", "add_websphere")}

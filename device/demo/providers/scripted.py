@@ -113,6 +113,10 @@ class Scripted(Site):
 
     # -- a person in front of the login page -----------------------------------------------
 
+    @property
+    def login_name(self):
+        return self._person.account
+
     def sign_in(self, browser, page):
         """Fills in the login form; returns the page that follows."""
         form = page.form("login")

@@ -99,6 +99,9 @@ class Twin(Site):
     def serve(self, request):
         raise NotImplementedError
 
+    def prepare(self):
+        """Makes the keys now; later the first request would wait for them."""
+
     def rotate(self):
         """Signs with a new key from now on."""
 
@@ -154,6 +157,7 @@ class Twin(Site):
                  redirect_uris=[client.redirect_uri], logout_uris=[client.logout_uri])
 
     def start(self):
+        self.prepare()
         self.listen(self._stage.provider_port,
                     self._stage.certificate(self._stage.provider_name))
 
@@ -194,6 +198,7 @@ def run_alone(twin_class):
         twin.set(**json.loads(text))
     except (ValueError, SettingsError) as error:
         sys.exit(f"--settings: {error}")
+    twin.prepare()
     port = twin.listen(options.port, (options.certificate, options.key))
     twin.url = f"https://{options.host}:{port}"
     print(twin.url, flush=True)
