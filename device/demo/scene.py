@@ -67,7 +67,8 @@ class Scene:
     def __init__(self, stage, provider=Glewlwyd):
         self.stage = stage
         self.person = Person("alice", secrets.token_urlsafe(9), "alice@plant7.example.net", {
-            "tid": "3f2a8f6e-5b1c-4d7e-9a60-2c4e8d10b7f5", "unique_name": "alice@plant7.example.net"})
+            "tid": "3f2a8f6e-5b1c-4d7e-9a60-2c4e8d10b7f5",
+            "unique_name": "alice@plant7.example.net"})
         self.provider = provider(stage, self.person)
         self.server = None
         self.settings = {}

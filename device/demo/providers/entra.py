@@ -64,7 +64,8 @@ class Refused(Exception):
 class Settings(Common):
     client_id: str = "6731de76-14a6-49ae-97bc-6eba6914391e"
     tenant_id: str = "3f2a8f6e-5b1c-4d7e-9a60-2c4e8d10b7f5"
-    tenant_domain: str = "ad.example.net"    # may stand in paths for the tenant ID
+    tenant_domain: str = "ad.example.net"    # may replace the tenant ID in paths
+    other_tenants: list = dataclasses.field(default_factory=list)  # without the application
     upn: str = "alice@ad.example.net"        # the user principal name, and what the user types
     guest: bool = False           # the user is of another directory
     external_name: bool = False   # a guest's name as the tenant stores it, with #EXT#
@@ -74,11 +75,13 @@ class Settings(Common):
     secret_expired: bool = False
     assigned: bool = True         # with "assignment required"
     consent: str = "given"        # "given", "asked" of the user, or "missing"
-    policy: str = ""              # conditional access: "", "block", "block at token", "mfa at token"
+    policy: str = ""              # conditional access: "block", "block at token", "mfa at token"
     id_token_flow: bool = False   # response_type=id_token is enabled
     app_key: str = ""             # "": the tenant's keys; "own"; or "missing" (claims mapping)
     keys: int = 5                 # how many the key set has
     rollover: int = 0             # a new key signs after so many key sets were fetched
+    mixed_versions: int = 0       # answer to a code of the other version's endpoint; 0: tokens (the
+                                  # documents are silent about it)
     era: int = 2024               # the year's form of error answers: 2018, 2020 or 2024
 
 
@@ -140,19 +143,16 @@ class Entra(Twin):
 
     def _issuer(self, tenant, v2):
         tenant = "{tenantid}" if tenant in SHARED else tenant
-        if tenant not in ("{tenantid}", CONSUMERS):
-            tenant = self.settings.tenant_id
         return f"{self.url}/{tenant}/v2.0" if v2 else f"https://sts.windows.net/{tenant}/"
 
     def _discovery(self, tenant, v2, query):
         path = "oauth2/v2.0" if v2 else "oauth2"
-        name = tenant if tenant in SHARED else self.settings.tenant_id
         appid = "?appid=" + query["appid"] if "appid" in query else ""
         # Without an application the v1.0 document names the key set of "common".
-        keys = f"{name}/discovery/v2.0/keys" if v2 else \
-            f"{name if appid else 'common'}/discovery/keys"
+        keys = f"{tenant}/discovery/v2.0/keys" if v2 else \
+            f"{tenant if appid else 'common'}/discovery/keys"
         return as_json({
-            "token_endpoint": f"{self.url}/{name}/{path}/token",
+            "token_endpoint": f"{self.url}/{tenant}/{path}/token",
             "token_endpoint_auth_methods_supported": [
                 "client_secret_post", "private_key_jwt", "client_secret_basic"],
             "jwks_uri": f"{self.url}/{keys}{appid}",
@@ -164,9 +164,9 @@ class Entra(Twin):
             "scopes_supported": ["openid"] + (
                 ["profile", "email", "offline_access"] if v2 else []),
             "issuer": self._issuer(tenant, v2), "request_uri_parameter_supported": False,
-            "authorization_endpoint": f"{self.url}/{name}/{path}/authorize",
+            "authorization_endpoint": f"{self.url}/{tenant}/{path}/authorize",
             "http_logout_supported": True, "frontchannel_logout_supported": True,
-            "end_session_endpoint": f"{self.url}/{name}/{path}/logout",
+            "end_session_endpoint": f"{self.url}/{tenant}/{path}/logout",
             "claims_supported": ["sub", "iss", "aud", "exp", "iat", "nonce", "name", "tid",
                                  "ver", "email"] + (["preferred_username"] if v2 else ["upn"]),
             "tenant_region_scope": None if tenant in SHARED else "EU"})
@@ -177,7 +177,7 @@ class Entra(Twin):
         match = PATH.fullmatch(request.path)
         if match is None:
             return Answer(404)
-        tenant, rest = match["tenant"], match["rest"]
+        tenant, rest = self._directory(match["tenant"]), match["rest"]
         v2 = "v2.0/" in rest
         try:
             what = rest.replace("v2.0/", "").removeprefix("oauth2/")
@@ -197,10 +197,16 @@ class Entra(Twin):
             return self._error(refusal, what)
         return Answer(404)
 
+    def _directory(self, tenant):
+        """The tenant ID for its other names; shared tenants, and unknown ones, as they are."""
+        tenant = tenant.lower()
+        return {self.settings.tenant_domain: self.settings.tenant_id,
+                "consumers": CONSUMERS}.get(tenant, tenant)
+
     def _check(self, endpoint, tenant):
         if endpoint in self.settings.fail:
             raise Refused(self.settings.fail[endpoint])
-        if tenant in (*SHARED, "consumers", self.settings.tenant_id, self.settings.tenant_domain):
+        if tenant in (*SHARED, CONSUMERS, self.settings.tenant_id, *self.settings.other_tenants):
             return
         raise Refused(90002 if DOMAIN.fullmatch(tenant) else 900023, tenant=tenant)
 
@@ -248,7 +254,7 @@ class Entra(Twin):
         return self._sign_in(tenant, v2, request, query)
 
     def _check_client(self, client, tenant):
-        if client != self.settings.client_id:
+        if client != self.settings.client_id or tenant not in (*SHARED, self.settings.tenant_id):
             raise Refused(700016, client=client, tenant=tenant)
         if tenant in SHARED and not self.settings.multi_tenant:
             raise Refused(50194, tenant=tenant)
@@ -352,6 +358,8 @@ class Entra(Twin):
         self._authenticate(tenant, form, 7000218)
         code = self._redeemed(form)
         settings = self.settings
+        if settings.mixed_versions and code.edition != ("v2.0" if v2 else "v1.0"):
+            raise Refused(settings.mixed_versions)
         if settings.policy in ("block at token", "mfa at token"):
             raise Refused(53003 if settings.policy == "block at token" else 50076)
         if settings.consent == "missing":

@@ -26,7 +26,8 @@ FAULTS = {
     # The request. 900144 and 9002313 are recorded with status 400; 9002313 comes as invalid_grant
     # for a code of the wrong form (MicrosoftDocs/azure-docs issue 63819).
     900144: Fault(400, "invalid_request", "The request lacks the parameter '{field}'."),
-    90014: Fault(400, "invalid_request", "The required field '{field}' of the credential is empty."),
+    90014: Fault(400, "invalid_request",
+                 "The required field '{field}' of the credential is empty."),
     9002313: Fault(400, "invalid_grant", "The request is malformed or invalid."),
     900561: Fault(400, "invalid_request", "The endpoint takes POST requests only."),
     70003: Fault(400, "unsupported_grant_type", "The grant type '{grant}' is not supported."),
@@ -38,8 +39,8 @@ FAULTS = {
                  "Tenant '{tenant}' not found: check the tenant ID and the cloud."),
     900023: Fault(400, "invalid_request",
                   "Tenant identifier '{tenant}' is neither a DNS name nor a known domain."),
-    50194: Fault(400, "invalid_request",
-                 "Application '{client}' is not a multi-tenant application; '{tenant}' is not for it."),
+    50194: Fault(400, "invalid_request", "Application '{client}' is not a multi-tenant one; "
+                 "'{tenant}' is not for it."),
     50059: Fault(400, "invalid_request", "The request names no tenant, nor does a credential."),
     # The client. 401 for the secret's codes (OfficeDev/microsoft-365-agents-toolkit issue 8621,
     # microsoft/botframework-sdk issue 6221, Azure-Samples/active-directory-dotnet-native-aspnetcore
@@ -54,8 +55,8 @@ FAULTS = {
                    "The request must contain 'client_assertion' or 'client_secret'."),
     7000216: Fault(401, "invalid_client", "'client_assertion', 'client_secret' or 'request' is "
                    "required for the grant 'client_credentials'."),
-    700025: Fault(401, "invalid_client",
-                  "The client is public: neither 'client_assertion' nor 'client_secret' may be sent."),
+    700025: Fault(401, "invalid_client", "The client is public: neither 'client_assertion' nor "
+                  "'client_secret' may be sent."),
     # The redirect URI. 50011 stays on the provider's page; 500112 is the token endpoint's.
     50011: Fault(400, "invalid_request",
                  "The redirect URI '{redirect}' does not match those of application '{client}'."),
@@ -73,7 +74,7 @@ FAULTS = {
     65001: Fault(400, "invalid_grant", "No consent was given to application '{client}'.",
                  {"suberror": "consent_required"}),
     # sunilbandla/vue-msal-sample issue 8.
-    50146: Fault(400, "invalid_request", "The application needs a signing key of its own: there is "
+    50146: Fault(400, "invalid_request", "The application needs its own signing key: there is "
                  "none, or it is expired or not yet valid."),
     # The authorization endpoint: those that go back to the client, and the pages.
     700054: Fault(400, "unsupported_response_type",

@@ -1,11 +1,12 @@
 """A twin of WebSphere Liberty as an OpenID Connect provider: one provider, one client, one user.
 
 It follows IBM's documentation of WebSphere Liberty, read in November 2026: "OpenID Connect endpoint
-URLs", "Configuring an OpenID Connect Provider in Liberty", "Invoking the Token Endpoint", "Configuring
-the OpenID Connect Provider to enable RP-initiated logout", and the messages CWOAU and CWWKS. What
-those leave open (statuses, which member an error comes with, the header and claims of a token) is as
-the project Open Liberty records it in the expectations of its public tests and in its issues; a
-comment names them. Descriptions of errors are in our own words, with the same values in them.
+URLs", "Configuring an OpenID Connect Provider in Liberty", "Invoking the Token Endpoint",
+"Configuring the OpenID Connect Provider to enable RP-initiated logout", and the messages CWOAU and
+CWWKS. What those leave open (statuses, which member an error comes with, the header and claims of a
+token) is as the project Open Liberty records it in the expectations of its public tests and in its
+issues; comments say where. Descriptions of errors are in our own words, with the same values in
+them.
 """
 
 import base64

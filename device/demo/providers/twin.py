@@ -84,8 +84,12 @@ class Twin(Site):
                 raise SettingsError(f"no setting '{name}' of that type")
         self.settings = dataclasses.replace(self.settings, **values)
 
+    @property
+    def clock_skew(self):
+        return self.settings.clock_skew
+
     def now(self):
-        return int(time.time()) + self.settings.clock_skew
+        return int(time.time()) + self.clock_skew
 
     # -- requests --------------------------------------------------------------------------
 
@@ -181,9 +185,10 @@ class Twin(Site):
 
 
 def run_alone(twin_class):
-    """Runs a twin as a program of its own, until it is ended by a signal."""
+    """Runs a twin alone, until a signal ends it."""
     parser = argparse.ArgumentParser(description=twin_class.title + ", for tests on this machine")
     parser.add_argument("--port", type=int, default=0, help="0: any free one, which is printed")
+    parser.add_argument("--address", default="127.0.0.1", choices=("127.0.0.1", "::1"))
     parser.add_argument("--host", default="localhost", help="the name in its own URLs")
     parser.add_argument("--certificate", required=True)
     parser.add_argument("--key", required=True)
@@ -199,10 +204,9 @@ def run_alone(twin_class):
     except (ValueError, SettingsError) as error:
         sys.exit(f"--settings: {error}")
     twin.prepare()
-    port = twin.listen(options.port, (options.certificate, options.key))
+    signals = {signal.SIGINT, signal.SIGTERM}
+    signal.pthread_sigmask(signal.SIG_BLOCK, signals)
+    port = twin.listen(options.port, (options.certificate, options.key), options.address)
     twin.url = f"https://{options.host}:{port}"
     print(twin.url, flush=True)
-    for number in (signal.SIGINT, signal.SIGTERM):
-        signal.signal(number, lambda *_: sys.exit(0))
-    while True:
-        signal.pause()
+    signal.sigwait(signals)

@@ -12,6 +12,7 @@ import socket
 import ssl
 import sys
 import threading
+import time
 import urllib.parse
 
 HTML = "text/html; charset=utf-8"
@@ -83,6 +84,10 @@ class Handler(http.server.BaseHTTPRequestHandler):
     def do_POST(self):  # noqa: N802
         self._serve(self.rfile.read(int(self.headers.get("Content-Length", 0))))
 
+    def date_time_string(self, timestamp=None):
+        """The header Date, by the site's clock."""
+        return super().date_time_string((timestamp or time.time()) + self.site.clock_skew)
+
     def _serve(self, body):
         parts = urllib.parse.urlsplit(self.path)
         form = None if body is None else _values(body.decode("utf-8", "replace"))
@@ -140,16 +145,19 @@ class Server(http.server.ThreadingHTTPServer):
 
 class Site:
     handler = Handler
+    clock_skew = 0  # seconds that the site's clock is ahead
 
     def __init__(self):
         self.seen = []  # method, path, query and form of each request
         self._servers = []
 
-    def listen(self, port, certificate):
-        """Opens a port of 127.0.0.1 with a certificate and key; returns the port's number."""
+    def listen(self, port, certificate, address="127.0.0.1"):
+        """Opens a port with a certificate and key; returns the port's number."""
         context = ssl.create_default_context(ssl.Purpose.CLIENT_AUTH)
         context.load_cert_chain(*certificate)
-        server = Server(("127.0.0.1", port), type("SiteHandler", (self.handler,), {"site": self}))
+        family = socket.AF_INET6 if ":" in address else socket.AF_INET
+        server = type("SiteServer", (Server,), {"address_family": family})(
+            (address, port), type("SiteHandler", (self.handler,), {"site": self}))
         # The handshake belongs to the connection's own thread.
         server.socket = context.wrap_socket(server.socket, server_side=True,
                                             do_handshake_on_connect=False)
