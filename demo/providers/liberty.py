@@ -242,7 +242,7 @@ class Liberty(Twin):
         if (form.get("j_username"), form.get("j_password")) != \
                 (settings.account, settings.password):
             return self._login_page("Wrong user name or password.")
-        there = base64.urlsafe_b64decode(request.cookie("WASReqURL") or b"").decode()
+        there = _plain(request.cookie("WASReqURL") or "")
         headers = self.open_session(settings.account)
         if not there.startswith(self.issuer + "/"):
             return dataclasses.replace(self._page("Login", "You are logged in."), headers=headers)
@@ -266,7 +266,7 @@ class Liberty(Twin):
         """Client ID, secret, and where they are: "basic" in a header, "post" in the body."""
         kind, _, value = request.headers.get("Authorization", "").partition(" ")
         if kind == "Basic":
-            name, _, secret = base64.b64decode(value).decode().partition(":")
+            name, _, secret = _plain(value).partition(":")
             return name, secret, "basic"
         form = request.form or {}
         return form.get("client_id"), form.get("client_secret"), "post"
@@ -401,8 +401,16 @@ class Liberty(Twin):
                 "logout": self.issuer + "/end_session"}
 
 
+def _plain(text):
+    """What is behind base64; nothing behind any other text."""
+    try:
+        return base64.b64decode(text, validate=True).decode()
+    except ValueError:
+        return ""
+
+
 def _remember(url):
-    value = base64.urlsafe_b64encode(url.encode()).decode()
+    value = base64.b64encode(url.encode()).decode()
     return f"WASReqURL={value}; Path=/; Secure; HttpOnly"
 
 

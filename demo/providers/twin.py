@@ -194,14 +194,13 @@ def run_alone(twin_class):
     parser.add_argument("--key", required=True)
     parser.add_argument("--settings", default="{}", help="a JSON object, or a file with one")
     options = parser.parse_args()
-    text = options.settings
-    if not text.lstrip().startswith("{"):
-        with open(text, encoding="utf-8") as file:
-            text = file.read()
-    twin = twin_class()
+    twin, text = twin_class(), options.settings
     try:
+        if not text.lstrip().startswith("{"):
+            with open(text, encoding="utf-8") as file:
+                text = file.read()
         twin.set(**json.loads(text))
-    except (ValueError, SettingsError) as error:
+    except (OSError, ValueError, TypeError, SettingsError) as error:
         sys.exit(f"--settings: {error}")
     twin.prepare()
     signals = {signal.SIGINT, signal.SIGTERM}

@@ -96,6 +96,8 @@ class LibertyToken(LibertyTest):
         self.assert_fault(page, "CWWKS1406E", 401, "invalid_client")
         self.assertNotIn("WWW-Authenticate", page.headers)
         self.assertIn('error="invalid_client"', self.basic("wrong").headers["WWW-Authenticate"])
+        page = self.post(self.BASE + "/token", self.form(client_id=None), Authorization="Basic ??")
+        self.assert_fault(page, "CWWKS1406E", 401, "invalid_client")
         self.twin.set(auth_method="any")
         self.assertEqual((self.basic().status, self.redeem().status), (200, 200))
 

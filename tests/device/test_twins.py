@@ -2,6 +2,7 @@
 
 import json
 import os
+import re
 import socket
 import subprocess
 import sys
@@ -70,6 +71,14 @@ class Alone(unittest.TestCase):
         with self.assertRaises(ConnectionRefusedError):
             socket.create_connection(("127.0.0.1", port), 10)
 
+    def test_settings_that_cannot_be_used(self):
+        for settings in ("{", '{"nothing": 1}', "[]", "/nothing/there"):
+            done = subprocess.run(
+                [sys.executable, "-B", f"{PROVIDERS}/liberty.py", "--certificate", "x", "--key", "x",
+                 "--settings", settings], capture_output=True, text=True, timeout=30, check=False)
+            self.assertEqual(done.returncode, 1)
+            self.assertRegex(done.stderr, "^--settings: [^\n]+\n$")
+
     def test_unknown_settings(self):
         url = self.start("liberty", "{}")
         for body in ({"nothing": 1}, {"realm": 1}, [], "realm"):
@@ -84,6 +93,18 @@ class Listed(unittest.TestCase):
              700054}
     LIBERTY = {"CWOAU0025E", "CWOAU0029E", "CWOAU0032E", "CWOAU0033E", "CWOAU0035E", "CWOAU0058E",
                "CWOAU0061E", "CWWKS1406E", "CWWKS1455E", "CWWKS1636E"}
+
+    def test_documented(self):
+        """The tables say how to reach each of them, and name no code that the twins lack."""
+        with open(f"{PROVIDERS}/../../docs/testing.md", encoding="utf-8") as file:
+            text = file.read().split("## The twins of")[1].split("\n## ")[0]
+        rows = [line for line in text.splitlines() if line.startswith("| ")]
+        named = {int(code) for row in rows for code in re.findall(r"\b\d{5,7}\b", row)}
+        self.assertLessEqual(self.ENTRA, named)
+        self.assertLessEqual(named, entra.entra_codes.FAULTS.keys())
+        named = set(re.findall(r"CWOAU\d{4}E|CWWKS\d{4}E", " ".join(rows)))
+        self.assertLessEqual(self.LIBERTY, named)
+        self.assertLessEqual(named, liberty.FAULTS.keys())
 
     def test_each_has_a_case(self):
         # test_code_redeemed_twice, test_consent, test_accounts
