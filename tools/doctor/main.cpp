@@ -45,6 +45,7 @@ void Run(const Check& check, doctor::Checkup& checkup) {
 int Examine(const doctor::Options& options) {
   doctor::Report report;
   doctor::Checkup checkup(options, report);
+  doctor::FindCaller(checkup);
   for (const Check& check : kChecks) Run(check, checkup);
   doctor::Progress("");
   options.json ? doctor::PrintJson(report) : doctor::PrintText(report, options.verbose);

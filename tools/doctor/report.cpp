@@ -45,7 +45,7 @@ void Report::Good(const std::string& id, const std::string& cause, const Place& 
 }
 
 void Report::Skip(const std::string& what, const std::string& because) {
-  Add({"skipped", Grade::kUnchecked, what + " could not be checked", {}, "", {}, because});
+  Add({"check-skipped", Grade::kUnchecked, what + " could not be checked", {}, "", {}, because});
 }
 
 void Report::AddRequest(Request request) {
