@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <chrono>
+#include <sstream>
 
 #include "doctor_faults.h"
 #include "doctor_site.h"
@@ -250,6 +251,63 @@ TEST(Doctor, WritesForPeople) {
                              "             [key-missing] Files\n"),
             std::string::npos)
       << verbose.out;
+}
+
+TEST(Doctor, SortsAndFoldsWhatItSays) {
+  Site site(true);
+  site.settings.removeMember("azure_logout_endpoint");
+  site.settings["azure_token_endpoint"] = "https://login.invalid/token";
+  site.settings["azure_cleint_id"] = site.settings["azure_client_id"];
+  site.settings.removeMember("azure_client_id");
+  site.deploy(false);
+  const Outcome run = runDoctor(site, true);
+  EXPECT_EQ(run.out.rfind("FAILURE      \"azure_cleint_id\" is not a key of azure.conf.\n", 0), 0u)
+      << run.out;
+  EXPECT_EQ(run.out.find("\"azure_client_id\" is missing"), std::string::npos) << run.out;
+  const size_t second = run.out.find("\nFAILURE      The host name cannot be resolved");
+  const size_t warning = run.out.find("\nWARNING      \"azure_logout_endpoint\" is missing.\n");
+  const size_t good = run.out.find("\nGOOD         ");
+  ASSERT_NE(second, std::string::npos) << run.out;
+  ASSERT_NE(warning, std::string::npos) << run.out;
+  ASSERT_NE(good, std::string::npos) << run.out;
+  EXPECT_LT(second, warning);
+  EXPECT_LT(warning, good);
+  EXPECT_NE(run.out.find("Requests: token endpoint ", good), std::string::npos) << run.out;
+}
+
+// --- on a terminal
+
+size_t longestLine(const std::string& text) {
+  std::istringstream lines(text);
+  size_t longest = 0;
+  for (std::string line; std::getline(lines, line);) longest = std::max(longest, line.size());
+  return longest;
+}
+
+TEST(DoctorTerminal, GetsProgressColourAndLinesOfItsWidth) {
+  Site site(true);
+  site.settings["azure_tenant_id"] = "ad.example.net";
+  site.columns = 70;
+  site.deploy(false);
+  Outcome run = runDoctor(site, true);
+  EXPECT_NE(run.out.find("Waiting for the token endpoint, https://"), std::string::npos) << run.out;
+  const size_t report = run.out.find("\x1b[1;31mFAILURE      \x1b[0m");
+  ASSERT_NE(report, std::string::npos) << run.out;
+
+  site.environment["NO_COLOR"] = "1";
+  run = runDoctor(site, true);
+  const size_t plain = run.out.find("FAILURE      ");
+  ASSERT_NE(plain, std::string::npos) << run.out;
+  EXPECT_EQ(run.out.find("\x1b[1;"), std::string::npos) << run.out;
+  EXPECT_LE(longestLine(run.out.substr(plain)), 70u) << run.out;
+}
+
+TEST(DoctorTerminal, IsNotAPipe) {
+  Site site(true);
+  site.deploy(false);
+  const Outcome run = runDoctor(site, true);
+  EXPECT_EQ(run.err, "");
+  EXPECT_EQ(run.out.find('\x1b'), std::string::npos) << run.out;
 }
 
 TEST(Doctor, ObeysNoTerminalCodesFromOutside) {

@@ -36,18 +36,13 @@ class Secret {
   // Marks in `hidden` what of the view belongs to this secret.
   void Mark(const View& view, const std::string& folded, bool whole,
             std::vector<bool>& hidden) const {
-    for (size_t at = 0; at + 1 < folded.size(); ++at) {
-      if (!pairs[Pair(folded, at)]) continue;
-      const size_t length = Longest(folded, at);
+    for (size_t at = 0; at < folded.size(); ++at) {
+      const bool begins = folded[at] == text[0];
+      if (!begins && (at + 1 == folded.size() || !pairs[Pair(folded, at)])) continue;
+      const size_t length = Longest(folded, at, view, whole);
       if (length == 0) continue;
-      const size_t begin = view.begin[at];
-      const size_t end = view.end[at + length - 1];
-      // Encoded, a few characters of the secret take up a window.
-      const bool enough =
-          length >= std::min(kWindow, text.size()) || (length >= 3 && end - begin >= kWindow);
-      if (whole ? length < text.size() || length < kWindow : !enough) continue;
-      std::fill(hidden.begin() + static_cast<std::ptrdiff_t>(begin),
-                hidden.begin() + static_cast<std::ptrdiff_t>(end), true);
+      std::fill(hidden.begin() + static_cast<std::ptrdiff_t>(view.begin[at]),
+                hidden.begin() + static_cast<std::ptrdiff_t>(view.end[at + length - 1]), true);
     }
   }
 
@@ -59,16 +54,40 @@ class Secret {
            static_cast<unsigned char>(from[at + 1]);
   }
 
-  // The length of the longest part of the secret that is in `from` at `at`.
-  size_t Longest(const std::string& from, size_t at) const {
+  // The length of the longest part of the secret that is in `from` at `at` and may not be shown.
+  size_t Longest(const std::string& from, size_t at, const View& view, bool whole) const {
     size_t longest = 0;
     for (size_t start = 0; start + longest < text.size(); ++start) {
       const size_t most = std::min(text.size() - start, from.size() - at);
       size_t length = 0;
       while (length < most && text[start + length] == from[at + length]) ++length;
-      longest = std::max(longest, length);
+      if (length <= longest) continue;
+      const size_t encoded = view.end[at + length - 1] - view.begin[at];
+      if (whole ? length == text.size() && length >= kWindow
+                : IsTooMuch(start, length, encoded, Rest(from, at + length))) {
+        longest = length;
+      }
     }
     return longest;
+  }
+
+  // The length of the escape that was cut off there, if it is one.
+  static size_t Rest(const std::string& from, size_t at) {
+    if (at >= from.size() || std::strchr("%&\\", from[at]) == nullptr) return 0;
+    size_t end = at + 1;
+    while (end < from.size() && (from[end] == '#' || Base64Value(from[end]) >= 0)) ++end;
+    return end - at;
+  }
+
+  // True for a window of the secret, or of its encoded form. Of the first characters of an encoded
+  // secret fewer are enough: the text may end within the next one.
+  bool IsTooMuch(size_t start, size_t length, size_t encoded, size_t rest) const {
+    if (length >= std::min(kWindow, text.size())) return true;
+    if (length >= 3 && encoded >= kWindow) return true;
+    if (start > 0) return false;
+    if (length >= 2 && rest > 0 && encoded + rest >= kWindow) return true;
+    if (encoded == length) return false;
+    return length >= 3 || encoded >= 5 * length || (length == 2 && encoded >= 3 * length);
   }
 
   const std::string text;
@@ -192,7 +211,7 @@ void Hide(const std::string& secret) {
 }
 
 std::string Clean(const std::string& text) {
-  return Replace(Clip(text, kLongestText), false);
+  return Replace(text.substr(0, kLongestText), false);
 }
 
 std::string Shown(const std::string& text, size_t length) {
