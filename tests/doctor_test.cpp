@@ -3,6 +3,8 @@
 
 #include <algorithm>
 #include <chrono>
+#include <cstdio>
+#include <fstream>
 #include <sstream>
 
 #include "doctor_faults.h"
@@ -31,6 +33,10 @@ bool contains(const std::vector<std::string>& texts, const std::string& text) {
 
 bool quotes(const Json::Value& finding, const std::string& text) {
   return contains(quoted(finding, "throws"), text) || contains(quoted(finding, "logs"), text);
+}
+
+std::string replaceOnce(std::string text, const std::string& from, const std::string& to) {
+  return text.replace(text.find(from), from.size(), to);
 }
 
 void expectNoSecret(const Site& site, const Outcome& run) {
@@ -275,6 +281,54 @@ TEST(Doctor, SortsAndFoldsWhatItSays) {
   EXPECT_NE(run.out.find("Requests: token endpoint ", good), std::string::npos) << run.out;
 }
 
+// --- JSON
+
+// The schema's objections to the output.
+std::string objections(const Outcome& run) {
+  const std::string path = "/usr/qova/doctor.json";
+  std::ofstream(path) << run.out;
+  FILE* const pipe = popen(("python3 -c 'import json, sys, jsonschema\n"
+                            "jsonschema.validate(json.load(open(sys.argv[1])), "
+                            "json.load(open(sys.argv[2])))' " +
+                            path + " " SCHEMA " 2>&1")
+                               .c_str(),
+                           "r");
+  std::string text;
+  char piece[4096];
+  for (size_t n; (n = fread(piece, 1, sizeof piece, pipe)) > 0;) text.append(piece, n);
+  return pclose(pipe) == 0 ? "" : text + "refused";
+}
+
+TEST(DoctorJson, FollowsItsSchema) {
+  Site site(true);
+  site.passToken = true;
+  site.arguments = {"--try-secret", "--name", "alice"};
+  site.settings["azure_token_endpoint"] = "https://login.invalid/token";
+  site.settings.removeMember("azure_tenant_id");
+  site.deploy(false);
+  Outcome run = runDoctor(site);
+  EXPECT_EQ(run.status, 1);
+  EXPECT_EQ(objections(run), "");
+  EXPECT_EQ(run.findings("check-skipped")[0]["because"].asString(), "name-not-resolved");
+
+  run.out = replaceOnce(run.out, "\"grade\"", "\"severity\"");
+  EXPECT_NE(objections(run), "");
+}
+
+TEST(DoctorJson, IsWrittenOfWrongUsageToo) {
+  for (const std::vector<std::string>& arguments :
+       {std::vector<std::string>{"--what"}, {"x"}, {"--timeout", "0"}, {"--user"}}) {
+    Site site(true);
+    site.arguments = arguments;
+    const Outcome run = runDoctor(site);
+    EXPECT_EQ(run.status, 2);
+    EXPECT_EQ(run.err, "");
+    EXPECT_EQ(run.document["exit_status"].asInt(), 2) << run.out;
+    EXPECT_NE(run.document["error"].asString(), "");
+    EXPECT_EQ(objections(run), "");
+  }
+}
+
 // --- on a terminal
 
 size_t longestLine(const std::string& text) {
@@ -359,6 +413,7 @@ TEST(DoctorCommandLine, Helps) {
   const Outcome run = runWith({"--help"});
   EXPECT_EQ(run.status, 0);
   EXPECT_EQ(run.out.rfind("Usage: ssoclient-doctor", 0), 0u);
+  EXPECT_EQ(runWith({"-h"}).out, run.out);
   EXPECT_EQ(runWith({"--version"}).out, "ssoclient-doctor " VERSION "\n");
 }
 

@@ -203,7 +203,7 @@ void CheckFiles(Checkup& checkup) {
     if (!CheckFile(checkup, file, in_use, settings)) continue;
     HideSecrets(kind, settings);
     if (in_use) {
-      checkup.library.ReadSettings(checkup.settings);
+      checkup.settings = checkup.library.ReadSettings();
       checkup.settings_read = true;
       checkup.settings_file = file.path;
       checkup.tenant = StringOf(settings, "azure_tenant_id");

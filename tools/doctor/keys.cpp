@@ -16,10 +16,6 @@ constexpr char kLogout[] = "the URL of the provider's end-session endpoint";
 constexpr char kWellknown[] =
     "the URL of the discovery document (.../.well-known/openid-configuration)";
 
-bool EndsWith(const std::string& text, const std::string& end) {
-  return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
-}
-
 // The checks of a token with one wrong claim.
 std::vector<Said> VerifyAnother(const Checkup& checkup, const char* claim) {
   Json::Value claims = GoodClaims(checkup);

@@ -31,6 +31,7 @@ constexpr Check kChecks[] = {
 // A check that ends early is a finding; the others still run.
 void Run(const Check& check, doctor::Checkup& checkup) {
   checkup.report.Begin(check.topic);
+  doctor::Progress(std::string("Checking: ") + check.topic);
   try {
     check.run(checkup);
   } catch (const std::exception& e) {

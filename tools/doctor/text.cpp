@@ -146,6 +146,10 @@ bool IsGuid(const std::string& text) {
   return true;
 }
 
+bool EndsWith(const std::string& text, const std::string& end) {
+  return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
+}
+
 bool HasSpaceAround(const std::string& text) {
   return !text.empty() && (IsSpace(text.front()) || IsSpace(text.back()));
 }

@@ -38,6 +38,7 @@ std::string DecodeBase64Url(const std::string& text);
 // True for 8-4-4-4-12 hexadecimal digits.
 bool IsGuid(const std::string& text);
 
+bool EndsWith(const std::string& text, const std::string& end);
 bool HasSpaceAround(const std::string& text);
 bool HasUpperCase(const std::string& text);
 

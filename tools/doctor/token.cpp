@@ -19,19 +19,12 @@ constexpr size_t kLongestToken = 1 << 20;
 constexpr char kNotSupported[] = " algorithm is not supported";
 
 std::string ReadToken() {
-  std::string token;
-  char chunk[4096];
-  while (std::cin.read(chunk, sizeof chunk), std::cin.gcount() > 0) {
-    token.append(chunk, static_cast<size_t>(std::cin.gcount()));
-    if (token.size() > kLongestToken) break;
-  }
+  std::string token(kLongestToken, '\0');
+  std::cin.read(token.data(), static_cast<std::streamsize>(token.size()));
+  token.resize(static_cast<size_t>(std::cin.gcount()));
   const size_t begin = token.find_first_not_of(" \t\r\n");
   if (begin == std::string::npos) return "";
   return token.substr(begin, token.find_last_not_of(" \t\r\n") - begin + 1);
-}
-
-bool EndsWith(const std::string& text, const std::string& end) {
-  return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
 }
 
 // A claim as it is shown: "\"aud\" is ...".
@@ -194,22 +187,30 @@ class TokenCheck {
     } else {
       Good("token-key", "kid", seen);
     }
-    CheckAlgorithm(UsableKid());
-  }
-
-  // The identifier of a key with which the library gets as far as the algorithm.
-  std::string UsableKid() const {
-    for (const Json::Value& key : Keys()) {
-      if (IsUsableKey(key) && key.isMember("kid") && key["kid"].isString()) {
-        return key["kid"].asString();
-      }
-    }
-    return "";
+    CheckAlgorithm(StringOf(UsableKey(), "kid"));
   }
 
   Json::Value Keys() const {
     const Json::Value& set = checkup.key_set;
     return set.isObject() && set["keys"].isArray() ? set["keys"] : Json::Value(Json::arrayValue);
+  }
+
+  // A key with which the library gets as far as the algorithm; null if there is none.
+  Json::Value UsableKey() const {
+    for (const Json::Value& key : Keys()) {
+      if (IsUsableKey(key) && !StringOf(key, "kid").empty()) return key;
+    }
+    return {};
+  }
+
+  // The key that the token names; null if there is none.
+  Json::Value NamedKey() const {
+    for (const Json::Value& key : Keys()) {
+      if (key.isObject() && key.isMember("kid") && TextOf(key, "kid") == TextOf(header, "kid")) {
+        return key;
+      }
+    }
+    return {};
   }
 
   void CheckAlgorithm(const std::string& kid) {
@@ -233,26 +234,15 @@ class TokenCheck {
 
   // --- signature
 
-  const Json::Value* FindKey(const Json::Value& keys) const {
-    for (const Json::Value& key : keys) {
-      if (key.isObject() && key.isMember("kid") && TextOf(key, "kid") == TextOf(header, "kid")) {
-        return &key;
-      }
-    }
-    return nullptr;
-  }
-
   void CheckSignature() {
-    const Json::Value keys = Keys();
-    const Json::Value* const key = azure ? FindKey(keys) : nullptr;
-    if (!supported || (azure && (key == nullptr || !IsUsableKey(*key)))) {
+    const Json::Value key = azure ? NamedKey() : Json::Value();
+    if (!supported || (azure && !IsUsableKey(key))) {
       return Good("token-signature", "", "The library does not get as far as the signature");
     }
     const std::string algorithm = TextOf(header, "alg");
     const Reply reply =
-        azure
-            ? checkup.library.VerifyRSA(token, StringOf(*key, "n"), StringOf(*key, "e"), algorithm)
-            : checkup.library.VerifyHMAC(token, checkup.settings.client_secret, algorithm);
+        azure ? checkup.library.VerifyRSA(token, StringOf(key, "n"), StringOf(key, "e"), algorithm)
+              : checkup.library.VerifyHMAC(token, checkup.settings.client_secret, algorithm);
     if (reply.ended && reply.Thrown().empty()) {
       return Good("token-signature", "", "The signature is right");
     }
