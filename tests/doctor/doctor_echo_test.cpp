@@ -12,8 +12,12 @@ using test::compact;
 using test::filler;
 using test::Site;
 
-// Puts a text that holds the secret into one place of the provider's answers.
-using Echo = void (*)(Site& site, const std::string& text);
+// One place of the provider's answers, and what puts a text that holds the secret there.
+struct Echo {
+  const char* name;
+  void (*put)(Site& site, const std::string& text);
+  bool shown;  // the doctor shows text from there
+};
 
 std::string oneLine(std::string text) {
   for (char& c : text) c = c == '\r' || c == '\n' ? ' ' : c;
@@ -81,25 +85,33 @@ class DoctorEcho : public testing::TestWithParam<Echo> {};
 
 TEST_P(DoctorEcho, ShowsNothingOfTheSecret) {
   const std::vector<std::string> forms = test::allSecretForms();
+  size_t hidden = 0;
   // Each form at a few of the positions; doctor_redact_test has all of them.
   constexpr size_t kPositions[] = {0, 52, 190, 197, 203, 300};
   for (size_t i = 0; i < forms.size(); i += 3) {
     Site site(true);
     site.settings["azure_client_secret"] = test::kOddSecret;
     site.arguments = {"--try-secret", "--verbose"};
-    GetParam()(site, filler(kPositions[i % std::size(kPositions)]) + forms[i] + " and so on");
+    GetParam().put(site, filler(kPositions[i % std::size(kPositions)]) + forms[i] + " and so on");
     site.deploy(false);
     const test::Outcome run = runDoctor(site, i % 2 == 0);
     ASSERT_NE(run.out, "") << run.err;
+    if (run.out.find("(hidden)") != std::string::npos) ++hidden;
     for (const std::string& form : {forms[i], std::string(test::kOddSecret)}) {
       ASSERT_EQ(test::windowIn(run.out + run.err, form), "") << run.out << run.err;
     }
   }
+  EXPECT_EQ(hidden > 0, GetParam().shown);
 }
 
-INSTANTIATE_TEST_SUITE_P(Places, DoctorEcho,
-                         testing::Values(inDescription, inError, inPage, inContentType, inReason,
-                                         inLocation, inDiscovery, inKeys, inClaims, inCertificate));
+INSTANTIATE_TEST_SUITE_P(
+    Places, DoctorEcho,
+    testing::Values(Echo{"Description", inDescription, true}, Echo{"Error", inError, true},
+                    Echo{"Page", inPage, false}, Echo{"ContentType", inContentType, true},
+                    Echo{"Reason", inReason, false}, Echo{"Location", inLocation, true},
+                    Echo{"Discovery", inDiscovery, true}, Echo{"Keys", inKeys, true},
+                    Echo{"Claims", inClaims, true}, Echo{"Certificate", inCertificate, true}),
+    [](const auto& given) { return given.param.name; });
 
 // The two IDs in each other's place.
 TEST(DoctorEcho, ShowsNeitherOfASwappedClientIdAndSecret) {
