@@ -14,6 +14,10 @@ namespace {
 
 constexpr size_t kShortestModulus = 256;  // bytes; RFC 7518, section 3.3
 
+Json::Value KeysOf(const Json::Value& set) {
+  return set.isObject() && set["keys"].isArray() ? set["keys"] : Json::Value(Json::arrayValue);
+}
+
 class KeySetCheck {
  public:
   explicit KeySetCheck(Checkup& checked) : checkup(checked) {}
@@ -122,6 +126,20 @@ class KeySetCheck {
 bool IsUsableKey(const Json::Value& key) {
   return !DecodeBase64Url(StringOf(key, "n")).empty() &&
          !DecodeBase64Url(StringOf(key, "e")).empty();
+}
+
+Json::Value AnyUsableKey(const Json::Value& key_set) {
+  for (const Json::Value& key : KeysOf(key_set)) {
+    if (IsUsableKey(key) && !StringOf(key, "kid").empty()) return key;
+  }
+  return {};
+}
+
+Json::Value KeyNamed(const Json::Value& key_set, const std::string& kid) {
+  for (const Json::Value& key : KeysOf(key_set)) {
+    if (key.isObject() && key.isMember("kid") && TextOf(key, "kid") == kid) return key;
+  }
+  return {};
 }
 
 std::string CheckKeySet(Checkup& checkup, const std::string& uri) {

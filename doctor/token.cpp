@@ -27,15 +27,6 @@ std::string ReadToken() {
   return token.substr(begin, token.find_last_not_of(" \t\r\n") - begin + 1);
 }
 
-// A claim as it is shown: "\"aud\" is ...".
-std::string Seen(const Json::Value& claims, const char* name) {
-  const std::string subject = Quote(name) + " of the token is ";
-  if (!claims.isObject() || !claims.isMember(name)) return subject + "missing";
-  const Json::Value& value = claims[name];
-  if (!value.isConvertibleTo(Json::stringValue)) return subject + TypeName(value);
-  return subject + Quote(Shown(value.asString(), 100));
-}
-
 class TokenCheck {
  public:
   TokenCheck(Checkup& checked, const std::string& text)
@@ -187,30 +178,7 @@ class TokenCheck {
     } else {
       Good("token-key", "kid", seen);
     }
-    CheckAlgorithm(StringOf(UsableKey(), "kid"));
-  }
-
-  Json::Value Keys() const {
-    const Json::Value& set = checkup.key_set;
-    return set.isObject() && set["keys"].isArray() ? set["keys"] : Json::Value(Json::arrayValue);
-  }
-
-  // A key with which the library gets as far as the algorithm; null if there is none.
-  Json::Value UsableKey() const {
-    for (const Json::Value& key : Keys()) {
-      if (IsUsableKey(key) && !StringOf(key, "kid").empty()) return key;
-    }
-    return {};
-  }
-
-  // The key that the token names; null if there is none.
-  Json::Value NamedKey() const {
-    for (const Json::Value& key : Keys()) {
-      if (key.isObject() && key.isMember("kid") && TextOf(key, "kid") == TextOf(header, "kid")) {
-        return key;
-      }
-    }
-    return {};
+    CheckAlgorithm(StringOf(AnyUsableKey(checkup.key_set), "kid"));
   }
 
   void CheckAlgorithm(const std::string& kid) {
@@ -235,7 +203,8 @@ class TokenCheck {
   // --- signature
 
   void CheckSignature() {
-    const Json::Value key = azure ? NamedKey() : Json::Value();
+    const Json::Value key =
+        azure ? KeyNamed(checkup.key_set, TextOf(header, "kid")) : Json::Value();
     if (!supported || (azure && !IsUsableKey(key))) {
       return Good("token-signature", "", "The library does not get as far as the signature");
     }
