@@ -19,13 +19,15 @@ from stage import StageError, run
 PATIENCE = 30  # seconds until a page that does not come is given up
 
 # The first line: root needs it, and the namespace is the sandbox here. The second: a small machine
-# without a screen. The last: fewer processes. The rest: no word to anybody but the pages.
+# without a screen. The last three: fewer processes, and no limit to how often an address
+# changes. The rest: no word to anybody but the pages.
 FLAGS = ("--no-sandbox",
          "--headless", "--disable-gpu", "--disable-dev-shm-usage", "--hide-scrollbars",
          "--disable-quic", "--no-first-run", "--disable-background-networking",
          "--disable-component-update", "--disable-sync", "--disable-default-apps",
          "--disable-extensions", "--no-proxy-server", "--lang=en-US",
-         "--disable-site-isolation-trials", "--renderer-process-limit=1")
+         "--disable-site-isolation-trials", "--renderer-process-limit=1",
+         "--disable-ipc-flooding-protection")
 
 # The relay page goes on by itself: what it showed is kept for who comes to look a moment later.
 KEEP = """
@@ -129,6 +131,12 @@ class Tab:
         """Presses keys, by their names in selenium's list, or characters."""
         for key in keys:
             self.driver.switch_to.active_element.send_keys(getattr(Keys, key, key))
+
+    def speak(self, languages):
+        """Sets the browser's languages, as Accept-Language lists them, and reloads the page."""
+        agent = self.script("return navigator.userAgent")
+        self.command("Emulation.setUserAgentOverride", userAgent=agent, acceptLanguage=languages)
+        self.driver.refresh()
 
     # -- what a person sees ----------------------------------------------------------------
 

@@ -58,7 +58,7 @@ server.document-root = "{www}"
 server.errorlog = "{log}"
 index-file.names = ("index.cgi")
 mimetype.assign = (".html" => "text/html; charset=utf-8", ".css" => "text/css",
-                   ".js" => "text/javascript")
+                   ".js" => "text/javascript", ".svg" => "image/svg+xml")
 cgi.assign = (".cgi" => "")
 ssl.engine = "enable"
 ssl.pemfile = "{certificate}"
@@ -93,6 +93,7 @@ TypesConfig /etc/mime.types
 AddType text/css .css
 AddType text/javascript .js
 AddType text/html .html
+AddType image/svg+xml .svg
 DocumentRoot "{www}"
 DirectoryIndex index.cgi
 SSLEngine on
@@ -137,7 +138,7 @@ error_log {log};
 events {{ }}
 http {{
   access_log off;
-  types {{ text/html html; text/css css; text/javascript js; }}
+  types {{ text/html html; text/css css; text/javascript js; image/svg+xml svg; }}
   client_body_temp_path {folder}/nginx-body;
   fastcgi_temp_path {folder}/nginx-fastcgi;
   proxy_temp_path {folder}/nginx-proxy;

@@ -83,7 +83,7 @@ class SignIn:
         url = self._redirect(self.browser.submit(page, "sign-out"), provider.url)
         if self.profile == "azure" and values_of(url).get("post_logout_redirect_uri") != relay:
             raise StepError(f"the logout URL does not lead back to the device: {url}")
-        if "Nobody is signed in" not in self.browser.get(device + "/index.cgi").text:
+        if 'id="sign-in"' not in self.browser.get(device + "/index.cgi").body:
             raise StepError("the device still has a session")
         self._done(f"{shown(url)} (status {self.browser.get(url).status})")
         say(f"{self.name}: user name {expected}")

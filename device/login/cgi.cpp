@@ -69,7 +69,7 @@ const std::string& OneLine(const std::string& text) {
 
 Request ReadRequest() {
   return {Environment("REQUEST_METHOD"), ReadQuery(Environment("QUERY_STRING")),
-          ReadCookies(Environment("HTTP_COOKIE"))};
+          ReadCookies(Environment("HTTP_COOKIE")), Environment("HTTP_ACCEPT_LANGUAGE")};
 }
 
 Values ReadQuery(const std::string& text) {

@@ -15,6 +15,7 @@ struct Request {
   std::string method;
   Values query;
   Values cookies;
+  std::string languages;  // Accept-Language
 };
 
 // ReadRequest takes the request from the environment that the web server set. The body is not

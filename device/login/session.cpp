@@ -20,8 +20,10 @@ std::string Open(const std::string& user) {
   return cgi::Cookie(kCookie, key);
 }
 
-std::string User(const cgi::Request& request) {
-  return Sessions().Get(cgi::Value(request.cookies, kCookie)).value_or("");
+std::optional<Session> Current(const cgi::Request& request) {
+  const std::optional<std::string> user = Sessions().Get(cgi::Value(request.cookies, kCookie));
+  if (!user) return std::nullopt;
+  return Session{*user, time(nullptr), ""};
 }
 
 std::string Close(const cgi::Request& request) {

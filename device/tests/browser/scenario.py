@@ -6,7 +6,12 @@ import os
 import time
 
 from chromium import Chromium
-from device import EXPECTED, STORE, DeviceTest, device
+from device import EXPECTED, HERE, STORE, DeviceTest, device
+
+with open(HERE + "/../www/texts.js", encoding="utf-8") as _file:
+    _text = _file.read()
+    TEXTS = json.loads(_text[_text.index("{"):_text.rindex("}") + 1])
+ENGLISH = TEXTS["en"]
 
 _chromium = None
 
@@ -83,15 +88,15 @@ class Scenario(DeviceTest):
     def user_shown(self):
         """Who the device says is signed in, on its front page; None if nobody is."""
         self.tab.open(self.device.front_url)
-        text = self.tab.find("main").text
-        if "Nobody is signed in." in text:
-            return None
-        return self.tab.find("#user").text
+        self.tab.find("main")
+        return None if self.tab.all("#sign-in") else self.tab.find("#user").text
 
     def assert_in(self, profile, origin="/index.cgi"):
         """The relay page said so, and went on to the origin, where the person is known."""
         self.on(origin)
-        self.assertEqual(self.tab.relay()[-1]["text"].split("\n\n"), ["Signed in", "Go on"])
+        self.assertEqual(self.tab.relay()[-1]["text"].split("\n"), [
+            ENGLISH["device"], ENGLISH["signed-in"], "", ENGLISH["signed-in-text"], "",
+            ENGLISH["onward"]])
         self.assertEqual(self.tab.find("#user").text, EXPECTED[profile])
         self.assert_logged("signed in: " + EXPECTED[profile])
         self.assertEqual(len(self.sessions()), 1)
@@ -100,22 +105,29 @@ class Scenario(DeviceTest):
         """The relay page says that the person is out, and the device knows nobody."""
         self.tab.wait(lambda: self.tab.title == "Signed out", "the relay page after the logout")
         self.assertEqual(self.tab.url, self.relay_url)
-        self.assertEqual(self.tab.find("main").text.split("\n"),
-                         ["Signed out", "Back to the device"])
+        self.assertEqual(self.tab.find("main").text.split("\n"), [
+            ENGLISH["signed-out"], ENGLISH["signed-out-text"], ENGLISH["front"]])
         self.assert_nobody()
 
     def assert_refused_here(self, reason, logged=None, lines=()):
-        """The relay page says no, with the reason as a person reads it; the log has the exact
-        text and what led to it; nobody is signed in."""
-        self.tab.wait(lambda: self.tab.title == "Not signed in", "the relay page's refusal")
-        self.assertTrue(self.tab.url.startswith(self.relay_url + "#"), self.tab.url)
-        self.assertEqual(self.tab.find("#outcome").text, "Not signed in")
-        self.assertEqual(self.tab.find("#reason").text, reason)
-        self.assertEqual(self.tab.find("#onward").text, "Back to the device")
+        """The relay page says no, in words of its own; the log has the exact text and what led to
+        it; no user is signed in."""
+        self.assert_refusal_shown()
         for line in (*lines, "sign-in failed: " + (reason if logged is None else logged)):
             self.assert_logged(line)
         self.assertFalse([line for line in self.log() if ": signed in: " in line])
         self.assert_nobody()
+
+    def assert_refusal_shown(self, code=None, words=ENGLISH):
+        """The relay page shows the sentences of that code, or else the general ones."""
+        self.tab.wait(lambda: self.tab.title == words["not-signed-in"], "the relay page's refusal")
+        self.assertTrue(self.tab.url.startswith(self.relay_url + "#"), self.tab.url)
+        self.assertEqual(self.tab.find("#outcome").text, words["not-signed-in"])
+        reason, hint = words["failures"].get(code, words["general"])
+        self.assertEqual(self.tab.find("#reason").text, reason)
+        self.assertEqual(self.tab.find("#help").text, hint)
+        self.assertEqual(self.tab.find("#again").text, words["again"])
+        self.assertEqual(self.tab.find("#onward").text, words["front"])
 
     def assert_nobody(self):
         self.assertEqual(self.sessions(), [])
