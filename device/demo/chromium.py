@@ -29,13 +29,20 @@ FLAGS = ("--no-sandbox",
          "--disable-site-isolation-trials", "--renderer-process-limit=1",
          "--disable-ipc-flooding-protection")
 
-# The relay page goes on by itself: what it showed is kept for who comes to look a moment later.
+# The relay page goes on by itself, and so does the one that is shown during the exchange: what they
+# showed, and for how long, is kept for who comes to look a moment later.
 KEEP = """
-if (location.pathname.endsWith("/relay.html")) {
+const name = /[/](relay|login)[.](html|cgi)$/.exec(location.pathname)?.[1];
+if (name) {
+  const kept = JSON.parse(sessionStorage.getItem(name) || "[]");
+  const keep = () => sessionStorage.setItem(name, JSON.stringify(kept));
   addEventListener("DOMContentLoaded", () => {
-    const kept = JSON.parse(sessionStorage.getItem("relay") || "[]");
     kept.push({url: location.href, text: document.body.innerText});
-    sessionStorage.setItem("relay", JSON.stringify(kept));
+    keep();
+  });
+  addEventListener("pagehide", () => {
+    kept[kept.length - 1].seconds = performance.now() / 1000;
+    keep();
   });
 }
 """
@@ -181,7 +188,14 @@ class Tab:
 
     def relay(self):
         """What relay pages showed to this person, oldest first: their URLs and texts."""
-        return self.script("return JSON.parse(sessionStorage.getItem('relay') || '[]')")
+        return self._kept("relay")
+
+    def waited(self):
+        """The same of the pages that are shown while the device asks the provider."""
+        return self._kept("login")
+
+    def _kept(self, name):
+        return self.script("return JSON.parse(sessionStorage.getItem(arguments[0]) || '[]')", name)
 
     def complaints(self):
         """What the browser has logged since the last time: scripts that fail, violations of a

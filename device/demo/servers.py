@@ -14,7 +14,8 @@ import forward
 from stage import FOLDER, WEB_USER, WWW, write
 
 HEADERS = {"X-Content-Type-Options": "nosniff", "X-Frame-Options": "DENY",
-           "Referrer-Policy": "no-referrer"}
+           "Referrer-Policy": "same-origin",  # a form says where it comes from
+           "Content-Security-Policy": "frame-ancestors 'none'"}
 
 
 class Server:
@@ -160,6 +161,7 @@ http {{
       fastcgi_param CONTENT_TYPE $content_type;
       fastcgi_param CONTENT_LENGTH $content_length;
       fastcgi_param SERVER_PROTOCOL $server_protocol;
+      fastcgi_param REMOTE_ADDR $remote_addr;
       {environment}
     }}
   }}

@@ -204,9 +204,7 @@ class Stage:
         for name in os.listdir(pages):
             shutil.copy(f"{pages}/{name}", WWW + "/webman/ssoclient")
         self.install_login(programs + "/login.cgi", WWW + "/webman/login.cgi", 0o4750)
-        entry = pwd.getpwnam(WEB_USER)
-        os.makedirs("/run/ssoclient", 0o700)
-        os.chown("/run/ssoclient", entry.pw_uid, entry.pw_gid)
+        self.set_options()
 
     @staticmethod
     def install_login(source, target, mode):
@@ -220,6 +218,12 @@ class Stage:
         """Makes the device's library folder known: a set-id program has no LD_LIBRARY_PATH."""
         write("/etc/ld.so.conf.d/qova.conf", QOVA + "/lib\n")
         run("ldconfig", "-X")
+
+    @staticmethod
+    def set_options(**values):
+        """Writes the login program's own settings; what is not given keeps its default."""
+        write(SETTINGS + "/login.conf", "# Written by the demo.\n" + "".join(
+            f"{key} = {value}\n" for key, value in values.items()))
 
     def configure(self, name, values, mode=0o600):
         """Writes one of the device's three settings files."""

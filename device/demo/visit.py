@@ -14,15 +14,15 @@ class Visit:
     STEPS = ("device page", "provider's login page", "name and password", "relay page",
              "back at the origin", "sign out", "signed out on the device")
 
-    def __init__(self, scene, chromium, profile, road):
+    def __init__(self, scene, chromium, profile):
         self.scene, self.profile = scene, profile
-        self.name = f"{profile}/{road}"
+        self.name = profile
         self.tab = chromium.person()
         self.step = 0
 
     def run(self):
         try:
-            self._road()
+            self._steps()
         except (TabError, StepError) as error:
             step = self.STEPS[self.step - 1]
             raise StepError(f"{self.name}: step {self.step} ({step}) failed: {error}") from error
@@ -37,7 +37,7 @@ class Visit:
     def _at(self, prefix):
         self.tab.wait(lambda: self.tab.url.startswith(prefix), prefix)
 
-    def _road(self):
+    def _steps(self):
         device, provider, tab = self.scene.stage.device, self.scene.provider, self.tab
 
         self._begin()

@@ -13,20 +13,18 @@
 #include <string>
 #include <vector>
 
+#include "environment.h"
+
 namespace {
 
 constexpr char kProgram[] = SSOCLIENT_LOGIN_PROGRAM;
 static_assert(kProgram[0] == '/', "the path of the login program is absolute");
 
-// What the login program reads, and what libcurl needs to know of a proxy. Nothing else of the web
-// server's environment gets to it. (HTTP_PROXY could be a header of the browser's.)
-constexpr const char* kKept[] = {"REQUEST_METHOD", "QUERY_STRING",       "HTTP_COOKIE",
-                                 "SSO_LOGIN_ROAD", "SSO_LOGIN_DEADLINE", "https_proxy",
-                                 "no_proxy"};
-
+// What the login program reads. Nothing else of the web server's environment gets to it: the rest
+// comes from its settings file.
 std::vector<std::string> Environment() {
-  std::vector<std::string> kept = {"PATH=/usr/bin:/bin"};
-  for (const char* name : kKept) {
+  std::vector<std::string> kept = {std::string("PATH=") + kPath};
+  for (const char* name : kRequestVariables) {
     if (const char* value = std::getenv(name)) kept.push_back(std::string(name) + "=" + value);
   }
   return kept;

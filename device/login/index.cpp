@@ -1,21 +1,20 @@
 // The device's front page: who is signed in, the way in and out, and how the last login failed.
 #include <ctime>
+#include <exception>
 #include <optional>
 #include <string>
-#include <utility>
 #include <vector>
 
 #include "cgi.h"
 #include "page.h"
 #include "session.h"
+#include "settings.h"
 
 namespace {
 
 constexpr char kStart[] = "/webman/login.cgi?action=start&amp;origin=/index.cgi";
 constexpr char kOutcome[] = "__Host-outcome";
 constexpr char kSession[] = "__Host-session";
-
-using Headers = std::vector<std::pair<std::string, std::string>>;
 
 // In the time zone of the device: the page does not know the person's.
 std::string Time(time_t seconds) {
@@ -54,30 +53,46 @@ std::string User(const page::Words& words, const Session& session, const page::O
          (refused ? Reference(words, outcome) : "");
 }
 
-std::string SignIn(const page::Words& words, const page::Outcome& outcome, bool ended) {
+std::string SignIn(const page::Words& words, const std::string& provider,
+                   const page::Outcome& outcome, bool ended) {
   const bool failed = !outcome.reference.empty();
   std::string body = "<h1>" + words.Get(failed ? "not-signed-in" : "sign-in") + "</h1>\n";
   body += failed ? Failure(words, outcome)
                  : "<p>" + words.Get(ended ? "session-ended" : "no-user") + "</p>\n";
   body += "<p class=\"actions\"><a id=\"sign-in\" class=\"button\" href=\"" + std::string(kStart) +
-          "\">" + words.Get("sign-in-with", "provider", words.Get("provider")) + "</a></p>\n";
+          "\">" + words.Get("sign-in-with", "provider", provider) + "</a></p>\n";
   return body + (failed ? Reference(words, outcome) : "");
+}
+
+// Nobody can sign in while the settings are refused; the page is shown all the same.
+Settings SettingsOrDefaults() {
+  try {
+    return ReadSettings();
+  } catch (const std::exception&) {
+    return {};
+  }
 }
 
 }  // namespace
 
 int main() {
   const cgi::Request request = cgi::ReadRequest();
-  const page::Words words(request);
-  const std::optional<Session> session = session::Current(request);
+  const Settings settings = SettingsOrDefaults();
+  const page::Words words(request.languages);
+  const std::optional<Session> session = session::Current(request, settings);
   const page::Outcome outcome = page::ReadOutcome(cgi::Value(request.cookies, kOutcome));
   const bool ended = !session && request.cookies.count(kSession) != 0;
   // What is shown once is not shown again.
-  Headers headers;
+  std::vector<std::string> headers;
   if (request.cookies.count(kOutcome) != 0) {
-    headers.push_back({"Set-Cookie", cgi::Cookie(kOutcome, "")});
+    headers.push_back("Set-Cookie: " + cgi::Cookie(kOutcome, ""));
   }
-  if (ended) headers.push_back({"Set-Cookie", cgi::Cookie(kSession, "")});
-  page::Write(words, words.Get("device"),
-              session ? User(words, *session, outcome) : SignIn(words, outcome, ended), headers);
+  if (ended) headers.push_back("Set-Cookie: " + cgi::Cookie(kSession, ""));
+  const std::string provider = settings.provider_name.empty()
+                                   ? words.Get("provider")
+                                   : cgi::EscapeHTML(settings.provider_name);
+  cgi::Page(page::Frame(
+                words, words.Get("device"),
+                session ? User(words, *session, outcome) : SignIn(words, provider, outcome, ended)),
+            headers);
 }

@@ -6,10 +6,10 @@
 #include <algorithm>
 #include <cctype>
 #include <cstdlib>
-#include <iostream>
 #include <memory>
 #include <stdexcept>
 
+#include "cgi.h"
 #include "texts.h"
 
 namespace page {
@@ -20,10 +20,6 @@ constexpr size_t kLongestList = 200;  // of languages; nobody speaks more
 
 // Without 0, 1, I, L, O and U; a reference number has eight of them.
 constexpr char kReference[] = "23456789ABCDEFGHJKMNPQRSTVWXYZ";
-
-constexpr char kPolicy[] =
-    "default-src 'none'; style-src 'self'; img-src 'self'; base-uri 'none'; "
-    "form-action 'self' https:; frame-ancestors 'none'";
 
 Json::Value ReadTexts() {
   const std::string script = kTexts;
@@ -75,15 +71,9 @@ std::string Choose(const std::string& accepted) {
   return best;
 }
 
-void CheckHeader(const std::string& value) {
-  if (std::any_of(value.begin(), value.end(),
-                  [](unsigned char c) { return c < 0x20 || c == 0x7f; }))
-    throw std::invalid_argument("control character in a header");
-}
-
 }  // namespace
 
-Words::Words(const cgi::Request& request) : language_(Choose(request.languages)) {}
+Words::Words(const std::string& accepted_languages) : language_(Choose(accepted_languages)) {}
 
 std::string Words::Get(const std::string& text, const std::string& name,
                        const std::string& value) const {
@@ -111,35 +101,27 @@ Outcome ReadOutcome(const std::string& text) {
   return good ? outcome : Outcome();
 }
 
-void Write(const Words& words, const std::string& title, const std::string& body,
-           const std::vector<std::pair<std::string, std::string>>& headers) {
-  std::string head =
-      "Status: 200 OK\nContent-Type: text/html; charset=utf-8\nCache-Control: no-store\n"
-      "Referrer-Policy: no-referrer\nContent-Security-Policy: " +
-      std::string(kPolicy) + "\n";
-  for (const auto& [name, value] : headers) {
-    CheckHeader(value);
-    head += name + ": " + value + "\n";
-  }
-  std::cout << head << "\n<!DOCTYPE html>\n<html lang=\"" << words.language() << "\" dir=\""
-            << words.Get("direction") << "\">\n<head>\n<meta charset=\"utf-8\">\n"
-            << "<meta name=\"viewport\" content=\"width=device-width, initial-scale=1\">\n<title>"
-            << title << "</title>\n"
-            << "<link rel=\"icon\" href=\"/webman/ssoclient/logo.svg\">\n"
-            << "<link rel=\"stylesheet\" href=\"/webman/ssoclient/relay.css\">\n</head>\n<body>\n"
-            << "<div class=\"card\">\n<header class=\"brand\">"
-            << "<img src=\"/webman/ssoclient/logo.svg\" alt=\"\"> <span>" << words.Get("device")
-            << "</span></header>\n<main>\n"
-            << body << "</main>\n</div>\n</body>\n</html>\n";
+std::string Frame(const Words& words, const std::string& title, const std::string& body) {
+  return "<!DOCTYPE html>\n<html lang=\"" + words.language() + "\" dir=\"" +
+         words.Get("direction") +
+         "\">\n<head>\n<meta charset=\"utf-8\">\n"
+         "<meta name=\"viewport\" content=\"width=device-width, initial-scale=1\">\n<title>" +
+         title +
+         "</title>\n<link rel=\"icon\" href=\"/webman/ssoclient/logo.svg\">\n"
+         "<link rel=\"stylesheet\" href=\"/webman/ssoclient/relay.css\">\n</head>\n<body>\n"
+         "<div class=\"card\">\n<header class=\"brand\">"
+         "<img src=\"/webman/ssoclient/logo.svg\" alt=\"\"> <span>" +
+         words.Get("device") + "</span></header>\n<main>\n" + body +
+         "</main>\n</div>\n</body>\n</html>\n";
 }
 
-void Wait(const cgi::Request& request, const std::string& onward) {
-  const Words words(request);
-  const std::string body =
-      "<div class=\"progress\"></div>\n<h1>" + words.Get("waiting") + "</h1>\n<p role=\"status\">" +
-      words.Get("waiting-text") + "</p>\n<p class=\"note\"><a id=\"onward\" href=\"" +
-      cgi::EscapeHTML(onward) + "\">" + words.Get("waiting-link") + "</a></p>\n";
-  Write(words, words.Get("waiting"), body, {{"Refresh", "0; url=" + onward}});
+std::string SigningIn(const std::string& url, const std::string& languages) {
+  const Words words(languages);
+  return Frame(words, words.Get("waiting"),
+               "<div class=\"progress\"></div>\n<h1>" + words.Get("waiting") +
+                   "</h1>\n<p role=\"status\">" + words.Get("waiting-text") +
+                   "</p>\n<p class=\"note\"><a id=\"onward\" href=\"" + cgi::EscapeHTML(url) +
+                   "\">" + words.Get("waiting-link") + "</a></p>\n");
 }
 
 }  // namespace page

@@ -5,9 +5,6 @@
 
 #include <string>
 #include <utility>
-#include <vector>
-
-#include "cgi.h"
 
 namespace page {
 
@@ -15,7 +12,7 @@ namespace page {
 class Words {
  public:
   // Takes the language that the browser likes best of those there are; English if there is none.
-  explicit Words(const cgi::Request& request);
+  explicit Words(const std::string& accepted_languages);
 
   const std::string& language() const { return language_; }
 
@@ -40,14 +37,11 @@ struct Outcome {
 // ReadOutcome reads "CODE.REFERENCE"; both are empty for anything else.
 Outcome ReadOutcome(const std::string& text);
 
-// Write writes a whole answer: the head with `headers` (names and values), and a page around
-// `body`, which is HTML. Throws std::invalid_argument, before anything is written, if a header
-// holds a control character.
-void Write(const Words& words, const std::string& title, const std::string& body,
-           const std::vector<std::pair<std::string, std::string>>& headers);
+// Frame returns a page around `body`, which is HTML.
+std::string Frame(const Words& words, const std::string& title, const std::string& body);
 
-// Wait writes a page that shows that the sign-in goes on, and that goes to `onward`, a relative
-// URL, at once. The browser shows it until the answer from there comes.
-void Wait(const cgi::Request& request, const std::string& onward);
+// SigningIn returns the page that a browser shows while it waits for the answer of `url`.
+// `languages` is the browser's Accept-Language.
+std::string SigningIn(const std::string& url, const std::string& languages);
 
 }  // namespace page

@@ -1,5 +1,6 @@
 """The device under test: its programs, one web server, and the scripted provider."""
 
+import json
 import os
 import secrets
 import subprocess
@@ -40,7 +41,7 @@ class Device:
         self.use(Lighttpd)
 
     def use(self, server, **environment):
-        """Runs the device under a web server, with that environment for the login program."""
+        """Runs the device under a web server, which passes that environment on."""
         if self.server is not None:
             self.server.stop()
         self.server = server(self.stage)
@@ -72,6 +73,10 @@ class Device:
 
     def choose(self, profile):
         self.stage.configure("profile", {"sso_enable": True, "sso_profile": profile}, 0o644)
+
+    def options(self, **values):
+        """The login program's settings from now on."""
+        self.stage.set_options(**values)
 
     @property
     def login_url(self):
@@ -107,6 +112,7 @@ class DeviceTest(unittest.TestCase):
         self.device.home.script = Script()
         self.device.home.seen.clear()
         self.device.choose("websphere")
+        self.device.options()
         self.browser = self.new_browser()
         self.addCleanup(self.device.home.release)
         self.log_start = len(self.device.stage.log.lines)
@@ -136,18 +142,22 @@ class DeviceTest(unittest.TestCase):
         return page.location
 
     def sign_in(self, **options):
-        """The whole road; returns the page with the redirect to the relay page."""
+        """The whole sign-in; returns the page with the redirect to the relay page."""
         return self.browser.get(self.callback_url(**options))
 
-    def run_program(self, query, cookie="", path=LOGIN, user=33):
+    def run_program(self, query, cookie="", path=LOGIN, user=33, **variables):
         """Runs the program as a web server does, without one; returns what it wrote.
 
         For what web servers refuse to pass on, and for programs that they do not start."""
-        done = subprocess.run(
-            [path], stdout=subprocess.PIPE, timeout=20, check=True, user=user, group=user,
-            extra_groups=[], env={"REQUEST_METHOD": "GET", "QUERY_STRING": query,
-                                  "HTTP_COOKIE": cookie})
-        return done.stdout.decode()
+        return self.run_raw(query, cookie, path, user, **variables).stdout.decode()
+
+    def run_raw(self, query, cookie="", path=LOGIN, user=33, before=None, timeout=30, **variables):
+        """The same, with the process's whole outcome. `before` runs in it, before the program."""
+        return subprocess.run(
+            [path], stdout=subprocess.PIPE, stderr=subprocess.PIPE, stdin=subprocess.DEVNULL,
+            timeout=timeout, check=False, user=user, group=user, extra_groups=[], preexec_fn=before,
+            env={"REQUEST_METHOD": "GET", "QUERY_STRING": query, "HTTP_COOKIE": cookie,
+                 "SCRIPT_NAME": "/webman/login.cgi", **variables})
 
     # -- outcomes --------------------------------------------------------------------------
 
@@ -164,6 +174,27 @@ class DeviceTest(unittest.TestCase):
         time.sleep(0.05)
         return self.device.stage.log.lines[self.log_start:]
 
+    def logged(self, part, seconds=5):
+        """The lines of the log that hold a text; waits until there is one."""
+        end = time.monotonic() + seconds
+        lines = []
+        while not lines and time.monotonic() < end:
+            lines = [line for line in self.log() if part in line]
+        return lines
+
+    def assert_logged(self, text):
+        self.assertTrue(any(line.endswith(text) for line in self.logged(text)),
+                        f"not in the log: {text}\n" + "\n".join(self.log()))
+
+    def change(self, profile, **values):
+        """Changes a provider's settings until the test ends."""
+        path = f"/usr/qova/etc/ssoclient/{profile}.conf"
+        with open(path, encoding="ascii") as file:
+            before = json.load(file)
+        self.addCleanup(self.device.stage.configure, profile, before)
+        self.device.stage.configure(profile, {**before, **{
+            f"{profile}_{name}": value for name, value in values.items()}})
+
     def user(self, browser=None):
         """Who the device says is signed in, None if nobody is."""
         page = (browser or self.browser).get(self.device.front_url)
@@ -176,10 +207,25 @@ class DeviceTest(unittest.TestCase):
         self.assertEqual(self.relay(page), {"origin": "/index.cgi", "success": "true"})
         self.assertEqual(self.user(), EXPECTED[profile])
 
-    def assert_refused(self, page, reason, logged=None, browser=None):
-        """The relay page gets the reason, the log the exact text, and nobody is signed in."""
-        self.assertEqual(self.relay(page), {"reason": reason, "success": "false"})
+    def reference(self, page, code, origin=None):
+        """The reference number of a failure with that code."""
+        values = self.relay(page)
+        self.assertRegex(values.get("reason", ""), f"^{code}[.][2-9A-HJKMNP-TV-Z]{{8}}$")
+        self.assertEqual(values["success"], "false")
+        self.assertEqual(values.keys() - {"origin"}, {"reason", "success"})
+        if origin is not None:
+            self.assertEqual(values.get("origin", ""), origin)
+        return values["reason"].split(".")[1]
+
+    def assert_refused(self, page, code, text, *more, browser=None):
+        """The relay page gets the code, the log the exact text with the same reference number, and
+        no user is signed in."""
+        reference = self.reference(page, code)
         self.assertIsNone(self.user(browser))
-        line = "sign-in failed: " + (reason if logged is None else logged)
-        self.assertTrue(any(entry.endswith(line) for entry in self.log()),
-                        f"not in the log: {line}\n" + "\n".join(self.log()))
+        lines = self.logged(f"sign-in failed [{reference}]")
+        self.assertEqual(len(lines), 1, "\n".join(self.log()))
+        self.assertIn(f"]: {code}, client 127.0.0.1, profile ", lines[0])
+        self.assertTrue(lines[0].endswith(": " + text), lines[0])
+        for part in more:
+            self.assertIn(part, lines[0])
+        return lines[0]

@@ -16,8 +16,8 @@ let timer;
 
 // A page of this site, by the rule of the login program (state.cpp); empty for anything else.
 function ownPage(origin) {
-  if (!/^\/[!#-;=?-[\]-~]{0,255}$/.test(origin)) return "";
-  if (origin.split(/[?#]/)[0].includes("//")) return "";
+  if (!/^\/([\w\-.~:/?#[\]@!$&'()*+,;=]|%[0-9a-f]{2})*$/i.test(origin)) return "";
+  if (origin.length > 256 || origin.split(/[?#]/)[0].includes("//")) return "";
   const link = document.createElement("a");  // unlike URL(), it never throws
   link.href = origin;
   return link.origin === location.origin ? origin : "";

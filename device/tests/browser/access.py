@@ -40,7 +40,7 @@ for (const node of all("[aria-labelledby], [aria-describedby]")) {
 }
 for (const node of all("a, button").filter(visible)) {
   const {width, height} = node.getBoundingClientRect();
-  const least = node.matches(".button") ? 44 : 20;
+  const least = node.matches(".button") ? 44 : 24;
   if (width < least || height < least) report("target-size", node);
   const quiet = node.matches("a:not(.button)");
   if (quiet && getComputedStyle(node).textDecorationLine !== "underline") {

@@ -3,7 +3,6 @@
 import atexit
 import json
 import os
-import time
 
 from chromium import Chromium
 from device import EXPECTED, HERE, STORE, DeviceTest, device
@@ -43,14 +42,6 @@ class Scenario(DeviceTest):
                if not text.startswith((self.device.provider.url, self.device.stage.device +
                                        "/favicon.ico"))]
         self.assertEqual(own, [])
-
-    def change_setting(self, profile, **values):
-        path = f"/usr/qova/etc/ssoclient/{profile}.conf"
-        with open(path, encoding="ascii") as file:
-            before = json.load(file)
-        self.addCleanup(self.device.stage.configure, profile, before)
-        self.device.stage.configure(profile, {**before, **{
-            f"{profile}_{name}": value for name, value in values.items()}})
 
     # -- what the person does --------------------------------------------------------------
 
@@ -109,11 +100,15 @@ class Scenario(DeviceTest):
             ENGLISH["signed-out"], ENGLISH["signed-out-text"], ENGLISH["front"]])
         self.assert_nobody()
 
-    def assert_refused_here(self, reason, logged=None, lines=()):
-        """The relay page says no, in words of its own; the log has the exact text and what led to
-        it; no user is signed in."""
-        self.assert_refusal_shown()
-        for line in (*lines, "sign-in failed: " + (reason if logged is None else logged)):
+    def assert_refused_here(self, code, text, lines=()):
+        """The relay page says no in the words of that code; the log has the exact text under the
+        same reference number, and what led to it; no user is signed in."""
+        self.assert_refusal_shown(code)
+        reference = self.tab.find("#reference").text.split()[-1]
+        failures = self.logged(f"sign-in failed [{reference}]: {code}, client 127.0.0.1, ")
+        self.assertEqual(len(failures), 1, "\n".join(self.log()))
+        self.assertTrue(failures[0].endswith(": " + text), failures[0])
+        for line in lines:
             self.assert_logged(line)
         self.assertFalse([line for line in self.log() if ": signed in: " in line])
         self.assert_nobody()
@@ -134,13 +129,6 @@ class Scenario(DeviceTest):
         self.assertIsNone(self.user_shown())
         names = [cookie["name"] for cookie in self.tab.driver.get_cookies()]
         self.assertNotIn("__Host-session", names)
-
-    def assert_logged(self, line):
-        """A line of the system log is that text: after the program's name, or a place in it."""
-        end = time.monotonic() + 5
-        while not any(entry.endswith((": " + line, " " + line)) for entry in self.log()):
-            if time.monotonic() > end:
-                self.fail(f"not in the log: {line}\n" + "\n".join(self.log()))
 
     @staticmethod
     def sessions():

@@ -1,10 +1,14 @@
 """Every page for everybody: by keyboard, on a phone, in the dark, with large text, to the right."""
 
+import os
+import secrets
 import unittest
+import urllib.parse
 
 from device import EXPECTED
 from access import cut, findings
 from scenario import ENGLISH, TEXTS, Scenario
+from stage import WWW, write
 
 PHONE = {"width": 320, "height": 568, "deviceScaleFactor": 2, "mobile": True}
 DESK = {"width": 1280, "height": 800, "deviceScaleFactor": 1, "mobile": False}
@@ -160,6 +164,40 @@ class Pages(Scenario):
                             selector)
             self.fits()
 
+    # -- while the device asks the provider ------------------------------------------------------
+
+    def waiting(self, accepted):
+        """The page that is shown during an exchange, in that language, without going on."""
+        page = self.browser.get(self.callback_url(), {
+            "Sec-Fetch-Dest": "document", "Accept-Language": accepted})
+        self.assertEqual(page.status, 200)
+        self.assertEqual(page.headers["Refresh"], "0; url=" + urllib.parse.urlsplit(
+            page.url)._replace(scheme="", netloc="").geturl() + "&go=1")
+        self.assertIn("default-src 'none'; style-src 'self'; img-src 'self'; base-uri 'none'",
+                      page.headers["Content-Security-Policy"])
+        name = f"/waiting-{secrets.token_hex(4)}.html"  # server and browser keep what they know
+        write(WWW + name, page.body)
+        self.tab.open(self.device.stage.device + name)
+        os.unlink(WWW + name)
+
+    def test_page_of_the_exchange(self):
+        """It is as good as the others, and something moves on it if the person likes that."""
+        for accepted, expected in (("de-DE,de;q=0.9", "de"), ("en", "en")):
+            for colours in ("light", "dark"):
+                with self.subTest(language=expected, colours=colours):
+                    self.media(prefers_color_scheme=colours)
+                    self.waiting(accepted)
+                    self.assertEqual(self.tab.title, TEXTS[expected]["waiting"])
+                    self.no_findings()
+                    self.assertEqual(self.moving(), 1)
+                    self.media(prefers_color_scheme=colours, prefers_reduced_motion="reduce")
+                    self.assertEqual(self.moving(), 0)
+                    self.tab.command("Emulation.setDeviceMetricsOverride", **PHONE)
+                    self.fits_twice()
+
+    def moving(self):
+        return self.tab.script("return document.getAnimations().length")
+
     # -- languages, keyboard -------------------------------------------------------------------
 
     def test_front_page_in_every_language(self):
@@ -174,6 +212,14 @@ class Pages(Scenario):
                 self.assertEqual(self.tab.find("#sign-in").text, words["sign-in-with"].replace(
                     "{provider}", words["provider"]))
                 self.assertEqual(self.tab.script("return document.documentElement.lang"), expected)
+
+    def test_name_of_the_provider(self):
+        for name in ("Example ID", "<b>R&D</b> \"ID\"", "{user} $& \u0645\u0632\u0648\u062f"):
+            with self.subTest(name=name):
+                self.device.options(provider_name=name)
+                self.tab.open(self.device.front_url)
+                self.assertEqual(self.tab.find("#sign-in").text, "Sign in with " + name)
+                self.no_findings()
 
     def test_outcome_on_the_front_page(self):
         for language, accepted in (("en", "en"), ("de", "de")):

@@ -3,6 +3,8 @@
 import time
 import unittest
 
+from selenium import webdriver
+
 from device import device
 from providers.glewlwyd import Glewlwyd
 from providers.lemonldap import LemonLDAP
@@ -99,19 +101,28 @@ class AtThePage(Scenario):
             self.assertNotIn("Signed in as", self.tab.text)
 
     def test_two_tabs(self):
-        """One login at a time: the first of two is refused, and uses up the second."""
+        """Each login has a cookie of its own: both sign in, in the other order."""
         self.to_provider("websphere")
         first = self.tab.driver.current_window_handle
         self.tab.find("#password")
         self.tab.driver.switch_to.new_window("tab")
         self.to_provider("websphere")
-        second = self.tab.driver.current_window_handle
+        self.enter()
+        self.on("/index.cgi")
+        self.assertEqual(self.tab.find("#user").text, "alice")
         self.tab.driver.switch_to.window(first)
         self.enter()
-        self.assert_refused_here("state does not belong to this login")
-        self.tab.driver.switch_to.window(second)
+        self.on("/index.cgi")
+        self.assertEqual(self.tab.find("#user").text, "alice")
+        self.assertEqual(len(self.sessions()), 1)
+
+    def test_impatient_click(self):
+        """A double click starts two logins; the second one is the one that counts."""
+        self.device.choose("websphere")
+        self.tab.open(self.device.front_url)
+        webdriver.ActionChains(self.tab.driver).double_click(self.tab.find("#sign-in")).perform()
         self.enter()
-        self.assert_refused_here("login was not started in this browser, or is used up")
+        self.assert_in("websphere")
 
     # -- keyboard -----------------------------------------------------------------------------
 

@@ -2,10 +2,12 @@
 
 import json
 import random
+import re
 import unittest
 import urllib.parse
 
-from device import HERE
+from device import EXPECTED, HERE
+from providers.scripted import Script
 from scenario import ENGLISH, TEXTS, Scenario
 
 START = "/webman/login.cgi?action=start"
@@ -294,13 +296,32 @@ class WithoutScripts(Relay):
         self.tab.command("Emulation.setScriptExecutionDisabled", value=True)
         self.addCleanup(self.tab.command, "Emulation.setScriptExecutionDisabled", value=False)
 
-    def title(self):
-        return self.tab.driver.find_element("css selector", "h1").text
-
     def test_relay_page_leads_to_the_front_page(self):
         self.tab.open(self.relay_url + "#success=true&origin=/index.cgi")
         self.on("/")
-        self.assertEqual(self.title(), ENGLISH["sign-in"])
+        self.assertEqual(self.tab.find("h1").text, ENGLISH["sign-in"])
+
+    def test_signs_in_and_out(self):
+        for profile in ("azure", "websphere"):
+            with self.subTest(profile=profile):
+                self.sign_in(profile)
+                self.on("/")
+                self.assertEqual(self.tab.find("#user").text, EXPECTED[profile])
+                self.sign_out()
+                self.on("/")
+                self.assert_nobody()
+
+    def test_refusal(self):
+        for profile in ("azure", "websphere"):
+            with self.subTest(profile=profile):
+                self.device.provider.script = Script(refuse={"error": "access_denied"})
+                self.to_provider(profile)
+                self.on("/")
+                self.assertEqual(self.tab.find("h1").text, ENGLISH["not-signed-in"])
+                self.assertEqual([self.tab.find("#reason").text, self.tab.find("#help").text],
+                                 ENGLISH["failures"]["denied"])
+                reference = self.tab.find("#reference").text.split()[-1]
+                self.assertEqual(len(self.logged(f"sign-in failed [{reference}]: denied, ")), 1)
 
 
 class Texts(unittest.TestCase):
@@ -319,6 +340,16 @@ class Texts(unittest.TestCase):
 
     def slots(self, words, name):
         return [key for key, text in words.items() if f"{{{name}}}" in text]
+
+    def test_every_code_has_a_sentence(self):
+        path = HERE + "/../login/failure.h"
+        with open(path, encoding="utf-8") as file:
+            names = re.search(r"kFailureNames\[\] = \{(.*?)\}", file.read(), re.S).group(1)
+        codes = set(re.findall(r'"([a-z-]+)"', names))
+        self.assertGreater(len(codes), 10)
+        for language, words in TEXTS.items():
+            with self.subTest(language=language):
+                self.assertEqual(set(words["failures"]), codes)
 
 
 if __name__ == "__main__":
