@@ -70,17 +70,32 @@ def write(path, text, mode=0o644):
 class SystemLog:
     """Reads /dev/log as a syslog daemon would and keeps the lines."""
 
+    MARK = "<14>mark"
+
     def __init__(self, path="/dev/log"):
         self.lines = []
         self._socket = socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM)
         self._socket.bind(path)
         os.chmod(path, 0o666)
+        self._path = path
+        self._marked = threading.Event()
         threading.Thread(target=self._read, daemon=True).start()
 
     def _read(self):
         while True:
             line = self._socket.recv(65536).decode("utf-8", "replace").rstrip("\0\n")
-            self.lines.append(line)
+            if line == self.MARK:
+                self._marked.set()
+            else:
+                self.lines.append(line)
+
+    def catch_up(self):
+        """Waits until all that was sent before is in `lines`."""
+        self._marked.clear()
+        with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as end:
+            end.sendto(self.MARK.encode(), self._path)
+        if not self._marked.wait(30):
+            raise StageError("the system log is not read")
 
 
 class Stage:

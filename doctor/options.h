@@ -1,12 +1,14 @@
 // The command line.
 #pragma once
 
+#include <stdexcept>
 #include <string>
 
 namespace doctor {
 
 struct Options {
   bool json = false;
+  bool verbose = false;
   bool offline = false;     // no request leaves the device
   bool token = false;       // a token comes on standard input
   bool try_secret = false;  // send the client secret to the token endpoint
@@ -16,9 +18,14 @@ struct Options {
   std::string name;         // a principal name to convert
 };
 
-enum class Usage { kRun, kDone, kWrong };
+// What is wrong with the command line, for one line.
+class UsageError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
 
-// Reads the command line. Prints help and version (kDone), or what is wrong with it (kWrong).
-Usage ParseOptions(int argc, char** argv, Options& options);
+// Reads the command line. Prints help or version and returns false if that is all that is wanted.
+// Throws UsageError; `options.json` is right by then.
+bool ParseOptions(int argc, char** argv, Options& options);
 
 }  // namespace doctor

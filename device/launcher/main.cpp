@@ -4,6 +4,7 @@
 //
 // A saved id does not survive exec, a real one does: root becomes the real identity, the web
 // server's stays the effective one, and the login program turns root into its saved identity.
+#include <signal.h>
 #include <syslog.h>
 #include <unistd.h>
 
@@ -41,6 +42,15 @@ void TakeIdentity() {
   }
 }
 
+// Whoever starts the launcher chooses its signal mask. A full system log must not hold it for ever.
+void SetDeadline() {
+  sigset_t none;
+  sigemptyset(&none);
+  sigprocmask(SIG_SETMASK, &none, nullptr);
+  signal(SIGALRM, SIG_DFL);
+  alarm(30);  // the login program sets its own
+}
+
 [[noreturn]] void Launch() {
   std::vector<std::string> kept = Environment();
   std::vector<char*> environment;
@@ -57,6 +67,7 @@ void TakeIdentity() {
 
 int main() {
   try {
+    SetDeadline();
     Launch();
   } catch (const std::exception& error) {
     syslog(LOG_ERR, "sign-in failed: %s", error.what());

@@ -17,11 +17,13 @@
 
 namespace {
 
-// The child's answer is a few lines: "user" and the name, or the number of the failure's code, its
-// text and what the provider says. It fits into one write to a pipe, so there is no half of it.
+// The child's answer is a few lines: "user", the name and the ID token, or the number of the
+// failure's code, its text and what the provider says. It fits into one write to a pipe, so there
+// is no half of it.
 constexpr char kUser[] = "user";
 constexpr size_t kLongestAnswer = 4096;
 constexpr size_t kLongestLine = 1000;
+constexpr size_t kLongestToken = 3500;
 
 std::string Lines(const Failure& failure) {
   std::string lines = std::to_string(static_cast<int>(failure.code)) + "\n";
@@ -35,7 +37,9 @@ std::string Lines(const Failure& failure) {
 // The child's work. The library's constructors are part of it, so they are in the try block too.
 std::string Answer(const SignIn& work) {
   try {
-    return std::string(kUser) + "\n" + Run(work) + "\n";
+    const SignedIn result = Run(work);
+    const bool fits = result.token.size() <= kLongestToken && !HasControl(result.token);
+    return std::string(kUser) + "\n" + result.user + "\n" + (fits ? result.token : "") + "\n";
   } catch (const Failure& failure) {
     return Lines(failure);
   } catch (const std::exception& error) {
@@ -85,8 +89,8 @@ std::vector<std::string> Split(const std::string& answer) {
   return lines;
 }
 
-std::string UserOf(const std::vector<std::string>& lines) {
-  if (lines.size() == 2 && lines[0] == kUser) return lines[1];
+SignedIn ResultOf(const std::vector<std::string>& lines) {
+  if (lines.size() == 3 && lines[0] == kUser) return {lines[1], lines[2]};
   if (lines.size() == 4) {
     const FailureCode code = static_cast<FailureCode>(std::stoi(lines[0]));
     throw Failure(code, lines[1], {lines[2], lines[3]});
@@ -102,8 +106,8 @@ std::string Describe(int status) {
 
 }  // namespace
 
-std::string Exchange(const std::string& code, const Json::Value& state, const std::string& profile,
-                     const Settings& settings) {
+SignedIn Exchange(const std::string& code, const Json::Value& state, const std::string& profile,
+                  const Settings& settings) {
   const SignIn work{code, state, profile, settings, getpid()};
   int ends[2];
   if (pipe2(ends, O_CLOEXEC) != 0) throw Failure(FailureCode::kInternal, "no pipe");
@@ -120,5 +124,5 @@ std::string Exchange(const std::string& code, const Json::Value& state, const st
   }
   if (!ended) throw Failure(FailureCode::kTimeout, "provider did not answer in time");
   if (status != 0) throw Failure(FailureCode::kInternal, Describe(status));
-  return UserOf(Split(answer));
+  return ResultOf(Split(answer));
 }

@@ -102,12 +102,12 @@ void Callback(Attempt& attempt, const Settings& settings) {
   const auto slot = TakeSlot(settings.max_exchanges);
   attempt.cookies = {ticket.expire};
   binding::Redeem(ticket);
-  const std::string user =
+  const SignedIn result =
       Exchange(cgi::Value(request.query, "code"), ticket.state, attempt.profile, settings);
-  const std::string cookie = session::Open(request, user, settings);
-  syslog(LOG_INFO, "signed in: %s", OneLine(user, user.size()).c_str());
+  const std::string cookie = session::Open(request, result.user, settings);
+  syslog(LOG_INFO, "signed in: %s", OneLine(result.user, result.user.size()).c_str());
   const std::string relay = GetSSORelayURL(true, cgi::Value(request.query, "state"), "");
-  cgi::Redirect(kPages + relay, {cookie, ticket.expire});
+  cgi::Redirect(kPages + relay, {cookie, HintCookie(attempt.profile, result.token), ticket.expire});
 }
 
 void Dispatch(Attempt& attempt, SSOProfile& profile, const Settings& settings) {

@@ -14,6 +14,9 @@ using namespace QOVA::SSO;
 
 namespace {
 
+constexpr char kTokenCharacters[] =
+    "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789-_.";
+constexpr char kHint[] = "__Host-hint";
 constexpr char kRelayPage[] = "/webman/ssoclient/relay.html";
 
 // The scheme, host and port of an absolute URL, as browsers write them.
@@ -54,7 +57,8 @@ void CheckSender(const cgi::Request& request, const std::string& site) {
 }
 
 // Where the provider ends its own session; empty if it has no such address.
-std::string ProviderLogout(SSOProfile& profile, const std::string& site) {
+std::string ProviderLogout(const cgi::Request& request, SSOProfile& profile,
+                           const std::string& site) {
   if (profile.GetSSOProfile() == "azure" && !site.empty()) {
     const std::string url = GetAzureSSOLogoutURL(site + "/index.cgi");
     CheckIdentity();
@@ -63,17 +67,24 @@ std::string ProviderLogout(SSOProfile& profile, const std::string& site) {
   std::string url = profile.GetSSOClient()->GetLogoutEndpoint();
   if (!url.empty() && !site.empty()) {  // the library adds the way back to Azure's alone
     url += "?post_logout_redirect_uri=" + URLEncode(site + kRelayPage);
+    const std::string hint = cgi::Value(request.cookies, kHint);
+    if (!hint.empty()) url += "&id_token_hint=" + URLEncode(hint);
   }
   return url;
 }
 
 }  // namespace
 
+std::string HintCookie(const std::string& profile, const std::string& token) {
+  const bool token_only = token.find_first_not_of(kTokenCharacters) == std::string::npos;
+  return cgi::Cookie(kHint, profile == "websphere" && token_only ? token : "");
+}
+
 void Logout(const cgi::Request& request, SSOProfile& profile) {
   // The device's address comes from its own settings: a browser may send any Host.
   const std::string site = Site(profile.GetSSOClient()->GetRedirectURI());
   CheckSender(request, site);
   const std::string cookie = session::Close(request);
-  const std::string url = ProviderLogout(profile, site);
-  cgi::Redirect(url.empty() ? kRelayPage : url, {cookie});
+  const std::string url = ProviderLogout(request, profile, site);
+  cgi::Redirect(url.empty() ? kRelayPage : url, {cookie, cgi::Cookie(kHint, "")});
 }

@@ -52,7 +52,7 @@ void CheckNonce(const Json::Value& claims, const Json::Value& state) {
 // What OpenIDConnectLogin does, step by step: with the checks that it leaves to its caller, and a
 // look at the provider's answer, which the WebSphere client drops when it is an error.
 template <class Client>
-std::string SignInWith(const SignIn& work) {
+SignedIn SignInWith(const SignIn& work) {
   Loaded<Client> client;
   DropRoot();
   process::DieWithParent(work.parent);
@@ -81,12 +81,12 @@ std::string SignInWith(const SignIn& work) {
     CheckUserName(user, "on this device");
     LookUp(user, work.settings);
   });
-  return user;
+  return {user, client->GetToken()};
 }
 
 }  // namespace
 
-std::string Run(const SignIn& work) {
+SignedIn Run(const SignIn& work) {
   if (work.profile == "azure") return SignInWith<AzureSSOClient>(work);
   if (work.profile == "websphere") return SignInWith<WebSphereSSOClient>(work);
   throw Failure(FailureCode::kNotSetUp, "profile not support.");

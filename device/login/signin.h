@@ -6,6 +6,7 @@
 
 #include <string>
 
+#include "exchange.h"
 #include "settings.h"
 
 struct SignIn {
@@ -16,5 +17,5 @@ struct SignIn {
   pid_t parent;
 };
 
-// Run signs the user in and returns the name. Throws Failure.
-std::string Run(const SignIn& work);
+// Run signs the user in. Throws Failure.
+SignedIn Run(const SignIn& work);

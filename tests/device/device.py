@@ -1,10 +1,12 @@
 """The device under test: its programs, one web server, and the scripted provider."""
 
+import contextlib
 import json
 import os
 import secrets
 import subprocess
 import sys
+import threading
 import time
 import unittest
 import urllib.parse
@@ -21,6 +23,8 @@ from stage import WWW, Stage  # noqa: E402
 EXPECTED = {"azure": "PLANT7.EXAMPLE.NET\\alice", "websphere": "alice"}
 STORE = "/run/ssoclient"
 LOGIN = WWW + "/webman/login.cgi"
+LIBEXEC = "/usr/qova/libexec/ssoclient-login"
+BUILD = os.environ["SSOCLIENT_BUILD"]
 
 
 class Device:
@@ -29,8 +33,7 @@ class Device:
     def __init__(self):
         self.stage = Stage(DEVICE, PROVIDER, 8443, 8444)
         self.stage.build()
-        build = os.environ["SSOCLIENT_BUILD"]
-        self.stage.install(build + "/prefix", build + "/device", HERE + "/../../device/www")
+        self.stage.install(BUILD + "/prefix", BUILD + "/device", HERE + "/../../device/www")
         self.person = Person("alice", secrets.token_urlsafe(9), "alice@plant7.example.net", {
             "tid": "tenant-7", "unique_name": "alice@plant7.example.net"})
         self.provider = Scripted(self.stage, self.person)
@@ -102,6 +105,56 @@ def device():
     return _device
 
 
+def programs(program="login.cgi"):
+    """Process ids of the login programs that run, parents before children."""
+    found = []
+    for name in os.listdir("/proc"):
+        if not name.isdigit():
+            continue
+        try:
+            with open(f"/proc/{name}/stat", encoding="ascii") as file:
+                stat = file.read()
+        except OSError:
+            continue
+        if f"({program})" in stat and stat.split()[2] != "Z":
+            found.append(int(name))
+    return sorted(found)
+
+
+def wait_until(condition, seconds=15):
+    end = time.monotonic() + seconds
+    while not condition():
+        if time.monotonic() > end:
+            raise AssertionError("waited in vain")
+        time.sleep(0.05)
+
+
+class SetId:
+    """The login program is set-id itself."""
+
+    program = "login.cgi"
+
+
+class Launched:
+    """The other way to the same identities: the launcher is set-id, the login program is not."""
+
+    program = "ssoclient-login"
+
+    @classmethod
+    def setUpClass(cls):
+        super().setUpClass()
+        cls.stage = device().stage
+        os.makedirs(os.path.dirname(LIBEXEC), exist_ok=True)
+        cls.stage.install_login(BUILD + "/device/login.cgi", LIBEXEC, 0o750)
+        cls.stage.install_login(BUILD + "/device/launcher.cgi", LOGIN, 0o4750)
+
+    @classmethod
+    def tearDownClass(cls):
+        os.unlink(LIBEXEC)
+        cls.stage.install_login(BUILD + "/device/login.cgi", LOGIN, 0o4750)
+        super().tearDownClass()
+
+
 def values_of(url):
     parts = urllib.parse.urlsplit(url)
     return dict(urllib.parse.parse_qsl(parts.query or parts.fragment))
@@ -111,6 +164,7 @@ class DeviceTest(unittest.TestCase):
     """A test with a fresh browser and a provider that behaves."""
 
     longMessage = True
+    program = SetId.program
 
     def setUp(self):
         self.device = device()
@@ -120,7 +174,7 @@ class DeviceTest(unittest.TestCase):
         self.device.options()
         self.browser = self.new_browser()
         self.addCleanup(self.device.home.release)
-        self.log_start = len(self.device.stage.log.lines)
+        self.forget_log()
 
     def new_browser(self):
         return Browser(self.device.stage.authority)
@@ -150,6 +204,12 @@ class DeviceTest(unittest.TestCase):
         """The whole sign-in; returns the page with the redirect to the relay page."""
         return self.browser.get(self.callback_url(**options))
 
+    def sign_out(self, browser=None, headers=None):
+        """Sends the form of the device's front page."""
+        browser = browser or self.browser
+        form = browser.get(self.device.front_url).form("sign-out")
+        return browser.post(self.device.login_url + "?action=logout", form["fields"], headers)
+
     def run_program(self, query, cookie="", path=LOGIN, user=33, **variables):
         """Runs the program as a web server does, without one; returns what it wrote.
 
@@ -164,6 +224,24 @@ class DeviceTest(unittest.TestCase):
             env={"REQUEST_METHOD": "GET", "QUERY_STRING": query, "HTTP_COOKIE": cookie,
                  "SCRIPT_NAME": "/webman/login.cgi", **variables})
 
+    @contextlib.contextmanager
+    def exchanging(self, url):
+        """A callback whose exchange waits for the provider; gives the ids of the two processes."""
+        self.device.provider.script = Script(silent=("token",))
+        before = len(self.device.provider.seen)
+        waiting = threading.Thread(target=self.browser.get, args=(url,))
+        waiting.start()
+        try:
+            wait_until(lambda: any(path.endswith("/token")
+                                   for _, path, _, _ in self.device.provider.seen[before:]))
+            running = programs(self.program)
+            self.assertEqual(len(running), 2)
+            yield running
+        finally:
+            self.device.provider.release()
+            waiting.join(30)
+        wait_until(lambda: not programs(self.program))
+
     # -- outcomes --------------------------------------------------------------------------
 
     def relay(self, page):
@@ -175,9 +253,13 @@ class DeviceTest(unittest.TestCase):
         return values_of(page.location)
 
     def log(self):
-        """What was logged since the test began, as soon as it is there."""
-        time.sleep(0.05)
+        """What was logged since the test began."""
+        self.device.stage.log.catch_up()
         return self.device.stage.log.lines[self.log_start:]
+
+    def forget_log(self):
+        self.device.stage.log.catch_up()
+        self.log_start = len(self.device.stage.log.lines)
 
     def logged(self, part, seconds=5):
         """The lines of the log that hold a text; waits until there is one."""
@@ -185,6 +267,7 @@ class DeviceTest(unittest.TestCase):
         lines = []
         while not lines and time.monotonic() < end:
             lines = [line for line in self.log() if part in line]
+            time.sleep(0 if lines else 0.05)
         return lines
 
     def assert_logged(self, text):

@@ -2,17 +2,15 @@
 
 import base64
 import concurrent.futures
-import hashlib
 import json
 import os
 import re
 import subprocess
-import threading
 import time
 import unittest
 import urllib.parse
 
-from device import EXPECTED, LOGIN, STORE, DeviceTest, device, values_of
+from device import EXPECTED, LIBEXEC, LOGIN, STORE, DeviceTest, Launched, values_of
 from providers.scripted import Script
 from servers import Apache, Busybox, Lighttpd, Nginx
 
@@ -99,10 +97,11 @@ class Callback(DeviceTest):
 
     def test_cookie_is_deleted_and_session_opened(self):
         cookies = self.sign_in().headers.get_all("Set-Cookie")
-        self.assertEqual(len(cookies), 2)
+        self.assertEqual(len(cookies), 3)
+        self.assertTrue(cookies[1].startswith("__Host-hint=eyJ"))
         self.assertRegex(cookies[0], "^__Host-session=[0-9a-f]{64}; Path=/; Secure; HttpOnly; "
                                      "SameSite=Lax$")
-        self.assertRegex(cookies[1], "^__Host-login-[0-9a-f]{16}=; Path=/; Secure; HttpOnly; "
+        self.assertRegex(cookies[2], "^__Host-login-[0-9a-f]{16}=; Path=/; Secure; HttpOnly; "
                                      "SameSite=Lax; Max-Age=0$")
 
     def test_no_cookie(self):
@@ -605,20 +604,17 @@ class Requests(DeviceTest):
 
 
 class Logout(DeviceTest):
-    def logout(self, browser=None, headers=None):
-        browser = browser or self.browser
-        page = browser.get(self.device.front_url)
-        return browser.post(self.device.login_url + "?action=logout",
-                            page.form("sign-out")["fields"], headers)
-
     def assert_logs_out(self, profile):
         """By way of the provider, which sends the browser back to the relay page."""
         self.device.choose(profile)
         self.sign_in()
-        page = self.logout()
+        page = self.sign_out()
         relay = self.device.stage.device + "/webman/ssoclient/relay.html"
-        self.assertEqual(page.location, f"{self.device.provider.url}/{profile}/logout"
-                         "?post_logout_redirect_uri=" + urllib.parse.quote(relay, safe=""))
+        hint = {"azure": "", "websphere": r"&id_token_hint=eyJ[A-Za-z0-9_-]+[.]eyJ[\w-]+[.][\w-]+"}
+        self.assertRegex(page.location, f"^{self.device.provider.url}/{profile}/logout"
+                         "[?]post_logout_redirect_uri=" + urllib.parse.quote(relay, safe="") +
+                         hint[profile] + "$")
+        self.assertEqual([cookie.name for cookie in self.browser.cookies], [])
         self.assertIsNone(self.user())
         self.assertEqual(self.browser.get(page.location).location, relay)
 
@@ -635,7 +631,7 @@ class Logout(DeviceTest):
                         {"Origin": "null", "Sec-Fetch-Site": "same-origin"}):
             with self.subTest(headers=headers):
                 self.sign_in()
-                self.logout(headers=headers)
+                self.sign_out(headers=headers)
                 self.assertIsNone(self.user())
 
     def test_forgery(self):
@@ -679,7 +675,7 @@ class Logout(DeviceTest):
         other.get(self.callback_url(other))
         key = next(cookie.value for cookie in self.browser.cookies
                    if cookie.name == "__Host-session")
-        self.logout()
+        self.sign_out()
         page = self.new_browser().get(self.device.front_url, {"Cookie": "__Host-session=" + key})
         self.assertIn('id="sign-in"', page.body)
         self.assertEqual(self.user(other), EXPECTED["websphere"])
@@ -687,7 +683,7 @@ class Logout(DeviceTest):
     def test_host_header_is_not_believed(self):
         self.device.choose("azure")
         self.sign_in()
-        page = self.logout(headers={"Host": "evil.example"})
+        page = self.sign_out(headers={"Host": "evil.example"})
         self.assertNotIn("evil", page.headers["Location"])
 
     def test_session_that_ended_meanwhile(self):
@@ -704,13 +700,13 @@ class Logout(DeviceTest):
             self.device.choose(profile)
             self.sign_in()
             self.change(profile, logout_endpoint="")
-            self.assertEqual(self.logout().location,
+            self.assertEqual(self.sign_out().location,
                              self.device.stage.device + "/webman/ssoclient/relay.html")
 
     def test_switched_off(self):
         self.sign_in()
         self.device.stage.configure("profile", {"sso_enable": False}, 0o644)
-        page = self.logout(headers={"Origin": self.device.stage.device})
+        page = self.sign_out(headers={"Origin": self.device.stage.device})
         self.assertEqual(page.location,
                          self.device.stage.device + "/webman/ssoclient/relay.html")
         self.assertIsNone(self.user())
@@ -738,37 +734,17 @@ class Identity(DeviceTest):
             self.run_program("action=start", user=65534)
 
 
-class Launched(DeviceTest):
-    """The other way to the same identities: the launcher is set-id, the login program is not."""
-
-    PROGRAM = "/usr/qova/libexec/ssoclient-login"
-    BAIT = {"LD_PRELOAD": "/nowhere.so", "BASH_ENV": "/nowhere", "HTTP_PROXY": "http://evil:1"}
-
-    @classmethod
-    def setUpClass(cls):
-        build = os.environ["SSOCLIENT_BUILD"] + "/device/"
-        cls.stage = device().stage
-        os.makedirs(os.path.dirname(cls.PROGRAM), exist_ok=True)
-        cls.stage.install_login(build + "login.cgi", cls.PROGRAM, 0o750)
-        cls.stage.install_login(build + "launcher.cgi", LOGIN, 0o4750)
-        device().use(Lighttpd, **cls.BAIT)
-
-    @classmethod
-    def tearDownClass(cls):
-        os.unlink(cls.PROGRAM)
-        cls.stage.install_login(os.environ["SSOCLIENT_BUILD"] + "/device/login.cgi", LOGIN, 0o4750)
-        device().use(Lighttpd)
-
+class ThroughTheLauncher(Launched, DeviceTest):
     def test_signs_in_and_out(self):
         for profile in ("azure", "websphere"):
             with self.subTest(profile=profile):
                 self.device.choose(profile)
                 self.assert_signed_in(self.sign_in(), profile)
-                self.browser.submit(self.browser.get(self.device.front_url), "sign-out")
+                self.sign_out()
                 self.assertIsNone(self.user())
 
     def test_under_the_other_web_servers(self):
-        self.addCleanup(self.setUpClass)
+        self.addCleanup(self.device.use, Lighttpd)
         for server in (Apache, Nginx, Busybox):
             with self.subTest(server=server.title or server.__name__):
                 self.device.use(server)
@@ -776,11 +752,11 @@ class Launched(DeviceTest):
                 self.assert_signed_in(self.sign_in(), "websphere")
 
     def test_not_through_the_launcher(self):
-        out = self.run_program("action=start", path=self.PROGRAM)
+        out = self.run_program("action=start", path=LIBEXEC)
         self.assertIn("#reason=internal.", out)
         self.assert_logged("login program is not installed set-id root")
         with self.assertRaises(PermissionError):
-            self.run_program("action=start", path=self.PROGRAM, user=65534)
+            self.run_program("action=start", path=LIBEXEC, user=65534)
 
     def refused(self, reason, **options):
         self.assertRegex(self.run_program("action=start", **options),
@@ -802,33 +778,9 @@ class Launched(DeviceTest):
             self.run_program("action=start", user=65534)
 
     def test_no_program(self):
-        os.rename(self.PROGRAM, self.PROGRAM + "-away")
-        self.addCleanup(os.rename, self.PROGRAM + "-away", self.PROGRAM)
+        os.rename(LIBEXEC, LIBEXEC + "-away")
+        self.addCleanup(os.rename, LIBEXEC + "-away", LIBEXEC)
         self.refused("login program does not start")
-
-
-def programs(program="login.cgi"):
-    """Process ids of the login programs that run, parents before children."""
-    found = []
-    for name in os.listdir("/proc"):
-        if not name.isdigit():
-            continue
-        try:
-            with open(f"/proc/{name}/stat", encoding="ascii") as file:
-                stat = file.read()
-        except OSError:
-            continue
-        if f"({program})" in stat and stat.split()[2] != "Z":
-            found.append(int(name))
-    return sorted(found)
-
-
-def wait_until(condition, seconds=15):
-    end = time.monotonic() + seconds
-    while not condition():
-        if time.monotonic() > end:
-            raise AssertionError("waited in vain")
-        time.sleep(0.05)
 
 
 if __name__ == "__main__":

@@ -25,9 +25,7 @@ class OnServer:
             with self.subTest(profile=profile):
                 self.device.choose(profile)
                 self.assert_signed_in(self.sign_in(), profile)
-                page = self.browser.get(self.device.front_url)
-                page = self.browser.post(self.device.login_url + "?action=logout",
-                                         page.form("sign-out")["fields"])
+                page = self.sign_out()
                 self.assertTrue(page.location.startswith(
                     f"{self.device.provider.url}/{profile}/logout"), page.location)
                 self.assertIsNone(self.user())
@@ -51,10 +49,7 @@ class OnServer:
         """The server passes on what the browser says of a form's page."""
         self.sign_in()
         for headers in ({"Sec-Fetch-Site": "cross-site"}, {"Origin": "https://other.example.org"}):
-            page = self.browser.get(self.device.front_url)
-            page = self.browser.post(self.device.login_url + "?action=logout",
-                                     page.form("sign-out")["fields"], headers)
-            self.reference(page, "sign-out-refused")
+            self.reference(self.sign_out(headers=headers), "sign-out-refused")
             self.assertEqual(self.user(), "alice")
 
     def test_error_with_markup(self):
