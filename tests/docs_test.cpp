@@ -196,7 +196,7 @@ TEST(DoctorPage, HoldsNoFindingThatIsNotSeeded) {
 TEST(DoctorPage, HoldsTheOptionsOfTheHelp) {
   const std::string page = contents(kRoot / "docs/man/ssoclient-doctor.8");
   const Texts helped = matches(contents(kRoot / "tools/doctor/options.cpp"), "\n  --([a-z-]+)");
-  EXPECT_EQ(helped.size(), 10u);
+  EXPECT_EQ(helped.size(), 11u);
   EXPECT_EQ(matches(page, "\n\\.It Fl -([a-z-]+)"), helped);
 }
 

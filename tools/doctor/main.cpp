@@ -6,6 +6,7 @@
 #include <iostream>
 
 #include "doctor/checkup.h"
+#include "doctor/explain.h"
 #include "doctor/options.h"
 #include "doctor/report.h"
 
@@ -43,6 +44,7 @@ int main(int argc, char** argv) {
       break;
   }
   try {
+    if (options.explain) return doctor::RunExplain(*options.explain, options.json);
     return Examine(options);
   } catch (const std::exception& e) {
     std::cerr << "ssoclient-doctor: " << e.what() << '\n';

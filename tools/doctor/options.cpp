@@ -22,6 +22,7 @@ Tells what the single sign-on of this device will do, and why a login would fail
   --try-secret     sends the client secret, with a false code, to the token endpoint
   --offline        sends nothing at all
   --timeout N      gives each request N seconds (1 to 300; 10)
+  --explain TEXT   explains the codes and messages in a pasted text ("-": standard input)
   --json           writes the findings as JSON
   --help           prints this help
   --version        prints the version
@@ -45,17 +46,13 @@ Usage Wrong(const std::string& what) {
   return Usage::kWrong;
 }
 
-constexpr struct option kOptions[] = {{"user", required_argument, nullptr, 'u'},
-                                      {"program", required_argument, nullptr, 'p'},
-                                      {"name", required_argument, nullptr, 'n'},
-                                      {"token", no_argument, nullptr, 't'},
-                                      {"try-secret", no_argument, nullptr, 's'},
-                                      {"offline", no_argument, nullptr, 'o'},
-                                      {"timeout", required_argument, nullptr, 'T'},
-                                      {"json", no_argument, nullptr, 'j'},
-                                      {"help", no_argument, nullptr, 'h'},
-                                      {"version", no_argument, nullptr, 'v'},
-                                      {nullptr, 0, nullptr, 0}};
+constexpr struct option kOptions[] = {
+    {"user", required_argument, nullptr, 'u'},    {"program", required_argument, nullptr, 'p'},
+    {"name", required_argument, nullptr, 'n'},    {"token", no_argument, nullptr, 't'},
+    {"try-secret", no_argument, nullptr, 's'},    {"offline", no_argument, nullptr, 'o'},
+    {"timeout", required_argument, nullptr, 'T'}, {"explain", required_argument, nullptr, 'e'},
+    {"json", no_argument, nullptr, 'j'},          {"help", no_argument, nullptr, 'h'},
+    {"version", no_argument, nullptr, 'v'},       {nullptr, 0, nullptr, 0}};
 
 }  // namespace
 
@@ -79,6 +76,9 @@ Usage ParseOptions(int argc, char** argv, Options& options) {
         break;
       case 'o':
         options.offline = true;
+        break;
+      case 'e':
+        options.explain = optarg;
         break;
       case 'j':
         options.json = true;
