@@ -157,6 +157,14 @@ TEST(Explain, NamesTheCodeAndNotThePlainErrorWithIt) {
       (Names{"AADSTS70002", "AADSTS70008"}));
 }
 
+TEST(Explain, GivesTheCodesAloneToo) {
+  const auto codes = doctor::CodesOf("error=invalid_grant&error_description=AADSTS54005%3a+x");
+  ASSERT_EQ(codes.size(), 1u);
+  EXPECT_STREQ(codes[0]->name, "AADSTS54005");
+  EXPECT_EQ(codes[0]->secret, doctor::SecretVerdict::kUnknown);
+  EXPECT_TRUE(doctor::CodesOf("id_token expired.").empty());
+}
+
 TEST(Explain, ReadsANumberAcrossALineBreakOnlyIfItGoesOn) {
   EXPECT_EQ(namesIn("AADSTS7000\r\n215: Invalid client secret"), Names{"AADSTS7000215"});
   EXPECT_EQ(namesIn("AADSTS70002\n  15: Invalid client secret"), Names{"AADSTS7000215"});

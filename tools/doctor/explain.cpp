@@ -125,7 +125,7 @@ bool HoldsError(const std::string& text, const std::string& name) {
   return false;
 }
 
-std::set<const Code*> CodesIn(const std::vector<std::string>& readings) {
+std::vector<const Code*> CodesIn(const std::vector<std::string>& readings) {
   std::set<const Code*> found;
   for (const std::string& text : readings) {
     for (size_t at = 0; at < text.size(); ++at) {
@@ -142,14 +142,17 @@ std::set<const Code*> CodesIn(const std::vector<std::string>& readings) {
     AddNumbers(text, found);
   }
   found.erase(nullptr);
-  if (!found.empty()) return found;
-  // The plain error that comes with a code says less than the code.
+  std::vector<const Code*> codes;
   for (const Code& code : Codes()) {
-    const auto holds = [&code](const std::string& text) { return HoldsError(text, code.name); };
-    if (code.source == CodeSource::kOAuth && std::any_of(readings.begin(), readings.end(), holds))
-      found.insert(&code);
+    // The plain error that comes with a code says less than the code.
+    if (code.source == CodeSource::kOAuth && found.empty()) {
+      const auto holds = [&code](const std::string& text) { return HoldsError(text, code.name); };
+      if (std::any_of(readings.begin(), readings.end(), holds)) codes.push_back(&code);
+    } else if (found.count(&code) > 0) {
+      codes.push_back(&code);
+    }
   }
-  return found;
+  return codes;
 }
 
 // True if the library's own words, or the login program's, lead to this place; or if nothing but a
@@ -258,15 +261,17 @@ std::string PlacesOf(unsigned met) {
   return places;
 }
 
+std::vector<const Code*> CodesOf(const std::string& text) {
+  return CodesIn(ReadingsOf(text));
+}
+
 std::vector<Explanation> Explain(const std::string& text) {
   const std::vector<std::string> readings = ReadingsOf(text);
   std::vector<Explanation> explanations;
-  const std::set<const Code*> found = CodesIn(readings);
-  for (const Code& code : Codes()) {
-    if (found.count(&code) == 0) continue;
-    explanations.push_back({code.name,
-                            std::string(NameOf(code.source)) + "; met at: " + PlacesOf(code.met),
-                            code.meaning, code.action, code.secret == SecretVerdict::kRefused});
+  for (const Code* const code : CodesIn(readings)) {
+    explanations.push_back({code->name,
+                            std::string(NameOf(code->source)) + "; met at: " + PlacesOf(code->met),
+                            code->meaning, code->action, code->secret == SecretVerdict::kRefused});
   }
   std::vector<std::string> lines;
   for (const std::string& reading : readings) {

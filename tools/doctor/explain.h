@@ -4,6 +4,8 @@
 #include <string>
 #include <vector>
 
+#include "doctor/codes.h"
+
 namespace doctor {
 
 struct Explanation {
@@ -17,6 +19,9 @@ struct Explanation {
 // The codes and messages that the text holds. Nothing of the text itself is in the result: it may
 // hold secrets, codes and tokens.
 std::vector<Explanation> Explain(const std::string& text);
+
+// The codes alone, in the order of the table.
+std::vector<const Code*> CodesOf(const std::string& text);
 
 // Explains the text, or standard input if it is "-", on standard output. The exit status: 0 if
 // anything was recognised, 1 if not.
