@@ -9,13 +9,13 @@
 #include <utility>
 
 #include "platform/platform.h"
-#include "sso/http_body.h"
-#include "sso/json.h"
+#include "sso/internal/http_body.h"
+#include "sso/internal/json.h"
+#include "sso/internal/libcurl.h"
+#include "sso/internal/provider.h"
+#include "sso/internal/split.h"
 #include "sso/jwt.h"
-#include "sso/libcurl.h"
 #include "sso/privilege.h"
-#include "sso/provider.h"
-#include "sso/split.h"
 #include "sso/utils.h"
 
 namespace QOVA {

@@ -14,9 +14,9 @@
 #include <cstring>
 #include <utility>
 
-#include "sso/json.h"
-#include "sso/owned.h"
-#include "sso/split.h"
+#include "sso/internal/json.h"
+#include "sso/internal/owned.h"
+#include "sso/internal/split.h"
 
 namespace QOVA {
 namespace JWT {

@@ -5,7 +5,7 @@
 #include <utility>
 
 #include "sso/azuresso.h"
-#include "sso/json.h"
+#include "sso/internal/json.h"
 #include "sso/privilege.h"
 #include "sso/webspheresso.h"
 

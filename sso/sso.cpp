@@ -9,8 +9,8 @@
 
 #include "platform/platform.h"
 #include "sso/azuresso.h"
-#include "sso/http_body.h"
-#include "sso/json.h"
+#include "sso/internal/http_body.h"
+#include "sso/internal/json.h"
 #include "sso/utils.h"
 #include "sso/webspheresso.h"
 

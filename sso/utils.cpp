@@ -15,10 +15,10 @@
 #include <new>
 
 #include "platform/platform.h"
-#include "sso/encoding.h"
-#include "sso/json.h"
-#include "sso/libcurl.h"
-#include "sso/owned.h"
+#include "sso/internal/encoding.h"
+#include "sso/internal/json.h"
+#include "sso/internal/libcurl.h"
+#include "sso/internal/owned.h"
 
 namespace QOVA {
 namespace SSO {

@@ -4,10 +4,10 @@
 
 #include <stdexcept>
 
-#include "sso/json.h"
+#include "sso/internal/json.h"
+#include "sso/internal/provider.h"
 #include "sso/jwt.h"
 #include "sso/privilege.h"
-#include "sso/provider.h"
 
 namespace QOVA {
 namespace SSO {
