@@ -12,12 +12,14 @@
 #include "doctor/json.h"
 #include "doctor/messages.h"
 #include "doctor/paste.h"
+#include "doctor/terminal.h"
 
 namespace doctor {
 
 namespace {
 
 constexpr size_t kLongestText = 64 * 1024;
+constexpr char kNothing[] = "No known code or message was recognised";
 
 bool IsDigit(char c) {
   return std::isdigit(static_cast<unsigned char>(c)) != 0;
@@ -217,7 +219,9 @@ void PrintJson(const std::vector<Explanation>& explanations) {
   Json::Value document(Json::objectValue);
   document["tool"] = "ssoclient-doctor";
   document["version"] = SSOCLIENT_VERSION;
+  document["verdict"] = explanations.empty() ? kNothing : "Codes or messages were recognised";
   document["exit_status"] = explanations.empty() ? 1 : 0;
+  document["findings"] = document["requests"] = Json::Value(Json::arrayValue);
   Json::Value& list = document["explanations"] = Json::Value(Json::arrayValue);
   for (const Explanation& one : explanations) {
     Json::Value value(Json::objectValue);
@@ -232,15 +236,19 @@ void PrintJson(const std::vector<Explanation>& explanations) {
 }
 
 void PrintText(const std::vector<Explanation>& explanations) {
+  const size_t width = TerminalWidth();
   for (const Explanation& one : explanations) {
-    std::cout << one.name << " (" << one.where << ")\n  means   " << one.meaning << "\n  action  "
-              << one.action << "\n";
+    std::cout << Wrap(one.name + " (" + one.where + ")", 0, width) << "  "
+              << Wrap(one.meaning, 2, width) << "  " << Wrap("-> " + one.action, 2, width);
     if (one.secret_refused) std::cout << "  The provider refused the client secret.\n";
   }
   if (!explanations.empty()) return;
-  std::cout << "No known code or message was recognised.\nMicrosoft explains every AADSTS code at "
-               "https://login.microsoftonline.com/error, IBM every CWOAU and CWWKS message in the "
-               "documentation of WebSphere Liberty.\n";
+  std::cout << kNothing << ".\n"
+            << Wrap(
+                   "Microsoft explains every AADSTS code at "
+                   "https://login.microsoftonline.com/error, IBM every CWOAU and CWWKS message in "
+                   "the documentation of WebSphere Liberty.",
+                   0, width);
 }
 
 }  // namespace

@@ -62,8 +62,8 @@ std::string objections() {
   EXPECT_GT(report["findings"].size(), 3u) << out;
   std::string found;
   for (const Json::Value& finding : report["findings"]) {
-    const std::string severity = finding["severity"].asString();
-    if (severity == "failure" || severity == "warning") found += finding.toStyledString();
+    const std::string grade = finding["grade"].asString();
+    if (grade == "failure" || grade == "warning") found += finding.toStyledString();
   }
   return found;
 }
