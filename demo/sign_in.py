@@ -84,7 +84,7 @@ class SignIn:
         back = "?post_logout_redirect_uri=" + urllib.parse.quote(relay, safe="")
         if self.profile == "azure" and not url.endswith(back):
             raise StepError(f"the logout URL does not lead back to the device: {url}")
-        if "Nobody is signed in" not in self.browser.get(device + "/index.cgi").text:
+        if 'id="sign-in"' not in self.browser.get(device + "/index.cgi").body:
             raise StepError("the device still has a session")
         self._done(f"{shown(url)} (status {self.browser.get(url).status})")
         say(f"{self.name}: user name {expected}")

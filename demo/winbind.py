@@ -96,7 +96,7 @@ class Checks:
             raise CheckError("signed in")
         self._expect_logged(text, logged)
         page = attempt.browser.get(self.scene.stage.device + "/index.cgi")
-        if "Nobody is signed in" not in page.text:
+        if 'id="sign-in"' not in page.body:
             raise CheckError("the device page says: " + page.text)
 
     def _expect_logged(self, text, first):

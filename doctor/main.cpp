@@ -5,6 +5,7 @@
 #include <iostream>
 
 #include "doctor/checkup.h"
+#include "doctor/explain.h"
 #include "doctor/options.h"
 #include "doctor/redact.h"
 #include "doctor/report.h"
@@ -71,7 +72,9 @@ int main(int argc, char** argv) {
   std::signal(SIGPIPE, SIG_IGN);
   doctor::Options options;
   try {
-    return doctor::ParseOptions(argc, argv, options) ? Examine(options) : 0;
+    if (!doctor::ParseOptions(argc, argv, options)) return 0;
+    if (options.explain) return doctor::RunExplain(*options.explain, options.json);
+    return Examine(options);
   } catch (const doctor::UsageError& e) {
     return GiveUp(options, e.what(), kWrongUsage);
   } catch (const std::exception& e) {

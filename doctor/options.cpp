@@ -26,6 +26,7 @@ Finds out why users cannot sign in to this device, and what to do about it. Run 
   --try-secret       sends the client secret, with a false code, to the token endpoint
   --offline          sends nothing
   --timeout SECONDS  the time for each request, 1 to 300 (default: 10)
+  --explain TEXT     explains the codes and messages in a pasted text ("-": standard input)
   --verbose          shows all findings, their identifiers, and what the library logs and throws
   --json             writes the findings as JSON
   -h, --help         prints this help
@@ -46,13 +47,19 @@ int ParseTimeout(const char* text) {
   return static_cast<int>(value);
 }
 
-constexpr struct option kOptions[] = {
-    {"user", required_argument, nullptr, 'u'},    {"program", required_argument, nullptr, 'p'},
-    {"name", required_argument, nullptr, 'n'},    {"token", no_argument, nullptr, 't'},
-    {"try-secret", no_argument, nullptr, 's'},    {"offline", no_argument, nullptr, 'o'},
-    {"timeout", required_argument, nullptr, 'T'}, {"verbose", no_argument, nullptr, 'V'},
-    {"json", no_argument, nullptr, 'j'},          {"help", no_argument, nullptr, 'h'},
-    {"version", no_argument, nullptr, 'v'},       {nullptr, 0, nullptr, 0}};
+constexpr struct option kOptions[] = {{"user", required_argument, nullptr, 'u'},
+                                      {"program", required_argument, nullptr, 'p'},
+                                      {"name", required_argument, nullptr, 'n'},
+                                      {"token", no_argument, nullptr, 't'},
+                                      {"try-secret", no_argument, nullptr, 's'},
+                                      {"offline", no_argument, nullptr, 'o'},
+                                      {"timeout", required_argument, nullptr, 'T'},
+                                      {"explain", required_argument, nullptr, 'e'},
+                                      {"verbose", no_argument, nullptr, 'V'},
+                                      {"json", no_argument, nullptr, 'j'},
+                                      {"help", no_argument, nullptr, 'h'},
+                                      {"version", no_argument, nullptr, 'v'},
+                                      {nullptr, 0, nullptr, 0}};
 
 // Errors in the command line are written as JSON too, wherever --json is.
 bool WantsJson(int argc, char** argv) {
@@ -100,6 +107,9 @@ bool ParseOptions(int argc, char** argv, Options& options) {
         break;
       case 'T':
         options.timeout = ParseTimeout(optarg);
+        break;
+      case 'e':
+        options.explain = optarg;
         break;
       case 'V':
         options.verbose = true;

@@ -1,6 +1,7 @@
 // The command line.
 #pragma once
 
+#include <optional>
 #include <stdexcept>
 #include <string>
 
@@ -16,6 +17,8 @@ struct Options {
   std::string user;         // the login program's user
   std::string program;      // the login program's file
   std::string name;         // a principal name to convert
+  // A pasted text; nothing but its explanation is wanted then.
+  std::optional<std::string> explain;
 };
 
 // What is wrong with the command line, for one line.

@@ -49,8 +49,9 @@ std::string Cookie(const std::string& name, const std::string& value, int second
 // header of its own.
 void Redirect(const std::string& location, const std::vector<std::string>& cookies);
 
-// Page sends a page that no other site can show in a frame, and that runs no scripts.
-void Page(const std::string& html);
+// Page sends a page that no other site can show in a frame, and that runs no scripts. `headers`
+// are lines of the head, which throw as those of Redirect do.
+void Page(const std::string& html, const std::vector<std::string>& headers);
 
 // EscapeHTML returns `text` so that a page shows it as it is.
 std::string EscapeHTML(const std::string& text);

@@ -85,7 +85,7 @@ void CheckError(const cgi::Values& query) {
 bool ShowsWaiting(const cgi::Request& request) {
   if (request.fetch_dest != "document" || request.query.count("go") != 0) return false;
   const std::string url = request.script + "?" + request.query_text + "&go=1";
-  cgi::Page(page::SigningIn(url, request.languages));
+  cgi::Page(page::SigningIn(url, request.languages), {"Refresh: 0; url=" + url});
   return true;
 }
 

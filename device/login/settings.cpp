@@ -38,9 +38,7 @@ constexpr Text kTexts[] = {
     {"proxy", &Settings::proxy},
     {"no_proxy", &Settings::no_proxy},
     {"user_lookup", &Settings::user_lookup},
-    {"device_name", &Settings::device_name},
     {"provider_name", &Settings::provider_name},
-    {"logo", &Settings::logo},
 };
 
 // False if the value is not a number, or out of range.

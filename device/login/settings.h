@@ -17,10 +17,8 @@ struct Settings {
   int max_exchanges = 8;             // at the same time
   int session_lifetime = 12 * 3600;  // seconds
   int max_sessions = 1000;
-  std::string user_lookup = "none";    // or "nss", or the path of a command
-  std::string device_name = "Device";  // for the pages
-  std::string provider_name = "your organisation";
-  std::string logo;
+  std::string user_lookup = "none";  // or "nss", or the path of a command
+  std::string provider_name;         // on the button that signs in
 
   std::vector<std::string> complaints;  // what in the file cannot be used
 };

@@ -287,9 +287,9 @@ class DeviceTest(unittest.TestCase):
         """Who the device says is signed in, None if nobody is."""
         page = (browser or self.browser).get(self.device.front_url)
         self.assertEqual(page.status, 200)
-        if "Nobody is signed in" in page.text:
+        if 'id="sign-in"' in page.body:
             return None
-        return page.text.split("Signed in as ")[1].split(". Sign out")[0]
+        return page.text.split("Signed in as ")[1].split(". Since ")[0]
 
     def assert_signed_in(self, page, profile):
         self.assertEqual(self.relay(page), {"origin": "/index.cgi", "success": "true"})

@@ -10,14 +10,12 @@ import time
 import unittest
 import urllib.parse
 
-from device import EXPECTED, LIBEXEC, LOGIN, STORE, DeviceTest, Launched, values_of
+from device import EXPECTED, HERE, LIBEXEC, LOGIN, STORE, DeviceTest, Launched, values_of
 from providers.scripted import Script
 from servers import Apache, Busybox, Lighttpd, Nginx
 
-FOREIGN = ("https://evil.example/", "//evil.example/", "/\\evil.example", "javascript:alert(1)",
-           "evil", "", "/" + "a" * 256, "/é", "/\"", "/<b>", "/a b", "/%zz", "/%2",
-           "/a\\b", "//[", "/a|b",
-           "/..//evil.example/", "/.//evil.example/", "/%2e%2e//evil.example/")
+with open(HERE + "/origins.json", encoding="utf-8") as _file:
+    ORIGINS = json.load(_file)  # the relay page's tests have the same ones
 
 
 def state_of(url):
@@ -58,21 +56,18 @@ class Start(DeviceTest):
                           self.start().location)
 
     def test_foreign_origin_is_dropped(self):
-        for origin in FOREIGN:
+        """Without a web server, which would refuse control characters itself."""
+        for origin in (*ORIGINS["foreign"], "/" + "a" * 256, "/a\r\nSet-Cookie: x=y\n\n"):
             with self.subTest(origin=origin):
-                self.assertNotIn("origin", state_of(self.start(origin=origin).location))
-
-    def test_control_characters_in_the_origin(self):
-        for origin in ("/a\r\nSet-Cookie: x=y\n\n", "/\t/evil.example", "/\0", "/a\x7f"):
-            out = self.run_program(urllib.parse.urlencode({"action": "start", "origin": origin}))
-            location = re.fullmatch("Status: 302 Found\nCache-Control: no-store\n"
-                                    "Set-Cookie: __Host-login-[^\n]*\nLocation: ([^\n]*)\n\n", out)
-            self.assertIsNotNone(location, out)
-            self.assertNotIn("origin", state_of(location[1]))
+                out = self.run_program(urllib.parse.urlencode({"action": "start", "origin": origin}))
+                location = re.fullmatch("Status: 302 Found\nCache-Control: no-store\n"
+                                        "Set-Cookie: __Host-login-[^\n]*\nLocation: ([^\n]*)\n\n",
+                                        out)
+                self.assertIsNotNone(location, out)
+                self.assertNotIn("origin", state_of(location[1]))
 
     def test_own_origin_is_kept(self):
-        for origin in ("/", "/index.cgi", "/a/b.html?x=1&y=%20", "/a?b=//c", "/~user/-_.",
-                       "/a:b,c(d)+e@f;g[h]!i*j$k'l&m=n#//o", "/" + "a" * 255):
+        for origin in (*ORIGINS["own"], "/" + "a" * 255):
             with self.subTest(origin=origin):
                 self.assertEqual(state_of(self.start(origin=origin).location)["origin"], origin)
 
@@ -560,7 +555,7 @@ class Requests(DeviceTest):
                       ticket.split("-")[1]):
             page = self.new_browser().get(self.device.front_url,
                                           {"Cookie": "__Host-session=" + value})
-            self.assertIn("Nobody is signed in", page.text)
+            self.assertIn('id="sign-in"', page.body)
 
     def test_name_with_markup(self):
         self.device.provider.script = Script(
@@ -677,7 +672,7 @@ class Logout(DeviceTest):
                    if cookie.name == "__Host-session")
         self.sign_out()
         page = self.new_browser().get(self.device.front_url, {"Cookie": "__Host-session=" + key})
-        self.assertIn("Nobody is signed in", page.text)
+        self.assertIn('id="sign-in"', page.body)
         self.assertEqual(self.user(other), EXPECTED["websphere"])
 
     def test_host_header_is_not_believed(self):

@@ -210,7 +210,7 @@ TEST(DoctorPage, HoldsNoFindingThatIsNotSeeded) {
 TEST(DoctorPage, HoldsTheOptionsOfTheHelp) {
   const std::string page = contents(kRoot / "docs/man/ssoclient-doctor.8");
   const Texts helped = matches(contents(kRoot / "doctor/options.cpp"), "\n  (?:-h, )?--([a-z-]+)");
-  EXPECT_EQ(helped.size(), 11u);
+  EXPECT_EQ(helped.size(), 12u);
   EXPECT_EQ(matches(page, "\n\\.It Fl (?:h , )?-([a-z-]+)"), helped);
 }
 
