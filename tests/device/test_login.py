@@ -2,6 +2,8 @@
 
 import base64
 import concurrent.futures
+import hashlib
+import hmac
 import json
 import os
 import re
@@ -44,6 +46,17 @@ class Start(DeviceTest):
         self.assertEqual(attributes, ["Path", "/", "Secure", "HttpOnly", "SameSite", "Lax",
                                       "Max-Age", "600"])
         self.assertEqual(state["origin"], "/index.cgi")
+
+    def test_seal(self):
+        """An HMAC of name, time and state, under the key that only root can read."""
+        page = self.start()
+        name, value = re.match("__Host-login-([^=]*)=([^;]*);", page.headers["Set-Cookie"]).groups()
+        made, seal = value.split("-")
+        with open(STORE + "/key", "rb") as file:
+            key = file.read()
+        self.assertEqual(len(key), 32)
+        text = f"login {name} {made} {values_of(page.location)['state']}"
+        self.assertEqual(seal, hmac.new(key, text.encode(), hashlib.sha256).hexdigest())
 
     def test_every_login_has_a_cookie_and_a_state_of_its_own(self):
         first, second = self.start(), self.start()
