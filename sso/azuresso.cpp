@@ -38,7 +38,7 @@ const Json::Value& FindKey(const Json::Value& key_set, const std::string& kid) {
   if (keys != nullptr && keys->isArray()) {
     for (const Json::Value& key : *keys) {
       const Json::Value* const key_id = FindMember(key, "kid");
-      if (key_id != nullptr && HasText(*key_id, kid)) return key;
+      if (key_id != nullptr && key_id->asString() == kid) return key;
     }
   }
   throw std::invalid_argument("kid does not exist in Azure verified kyes");

@@ -213,15 +213,6 @@ bool VerifyHMAC(const SigningInput& input, const std::string& key_text,
 
 }  // namespace
 
-jwt_exception::jwt_exception(const std::string& message) : std::runtime_error(message) {}
-jwt_exception::~jwt_exception() = default;
-
-jwt_not_support::jwt_not_support(const std::string& message) : jwt_exception(message) {}
-jwt_not_support::~jwt_not_support() = default;
-
-jwt_verify_failed::jwt_verify_failed(const std::string& message) : jwt_exception(message) {}
-jwt_verify_failed::~jwt_verify_failed() = default;
-
 Jwt::Jwt(std::string token) {
   SSO::Pieces<3> segments;
   if (!SSO::Split(token, '.', segments)) throw std::invalid_argument("bad jwt format!");

@@ -4,6 +4,7 @@
 
 #include <stdexcept>
 
+#include "sso/internal/encoding.h"
 #include "sso/internal/json.h"
 #include "sso/internal/provider.h"
 #include "sso/jwt.h"

@@ -8,7 +8,6 @@
 #include <stdexcept>
 #include <utility>
 
-#include "platform/platform.h"
 #include "sso/internal/encoding.h"
 #include "sso/internal/json.h"
 #include "sso/internal/nonce.h"
@@ -44,15 +43,6 @@ std::string MakeState(const Json::Value& parameters, const std::string& nonce) {
 }
 
 }  // namespace
-
-std::string EncodeBase64(const std::string& bytes) {
-  constexpr int kOption = 1;
-  char text[1024] = {};
-  if (QOVABase64Encode(bytes.data(), bytes.size(), text, sizeof text, kOption) == 0) {
-    throw sso_op_failed("encode base64 failed.");
-  }
-  return text;
-}
 
 std::string AuthorizationURL(const std::string& endpoint, const std::string& client_id,
                              const std::string& redirect_uri, const char* scope,

@@ -12,9 +12,6 @@
 namespace QOVA {
 namespace SSO {
 
-// The platform's base64 text. Throws sso_op_failed if it does not fit the platform's buffer.
-std::string EncodeBase64(const std::string& bytes);
-
 // The URL of an authorization request with a fresh nonce. Its state is made of the caller's
 // parameters and the digest of the nonce.
 std::string AuthorizationURL(const std::string& endpoint, const std::string& client_id,
