@@ -6,7 +6,6 @@
 #include <locale>
 #include <new>
 #include <stdexcept>
-#include <utility>
 
 #include "platform/platform.h"
 #include "sso/internal/http_body.h"
@@ -93,7 +92,12 @@ AzureSSOClient::AzureSSOClient() {
 AzureSSOClient::~AzureSSOClient() = default;
 
 std::string AzureSSOClient::GetAccessTokenReqURI(const Json::Value& params) {
-  return AuthorizationURL(authEndpoint, clientID, redirectURI, "openid", params);
+  AuthorizationRequest request;
+  request.endpoint = authEndpoint;
+  request.client_id = clientID;
+  request.redirect_uri = redirectURI;
+  request.scope = "openid";
+  return AuthorizationURL(request, params);
 }
 
 void AzureSSOClient::RedirectAuthEndpoint(const Json::Value& params) {
@@ -101,7 +105,12 @@ void AzureSSOClient::RedirectAuthEndpoint(const Json::Value& params) {
 }
 
 std::string AzureSSOClient::GetIDTokenReqParams() {
-  return TokenRequestBody(clientID, clientSecret, redirectURI, code);
+  TokenRequest request;
+  request.client_id = clientID;
+  request.client_secret = clientSecret;
+  request.redirect_uri = redirectURI;
+  request.code = code;
+  return TokenRequestBody(request);
 }
 
 void AzureSSOClient::ProcessTokenResponse(std::string response) {
@@ -128,7 +137,8 @@ void AzureSSOClient::RequestKeysInfo(std::string uri, Json::Value& keys) {
   } catch (const sso_err_resp& e) {
     syslog(LOG_ERR, "%s:%d request wellknown uri %s.", kUnit, __LINE__, e.what());
   }
-  // httpGet has done this already; once more does no harm.
+  // One clean-up more than httpGet's own: it takes a reference that the host program may hold
+  // (docs/integrating.md). Programs in the field rely on what they see now, so it stays.
   CleanUpCurl();
 }
 
