@@ -45,7 +45,7 @@ constexpr struct {
   void (*login)(const std::string& code, std::string& user);
 } kLogins[] = {{kAzureProfile, Login<AzureSSOClient>},
                {kWebSphereProfile, Login<WebSphereSSOClient>}};
-static_assert(std::size(kLogins) == std::size(kSupportedProfiles), "a profile without a login");
+static_assert(std::size(kLogins) == std::size(kSupportedProfiles));  // each has its login
 
 // Finds the "origin" that the login program packed into a state; false if there is none.
 bool FindOrigin(const std::string& state, std::string& origin) {

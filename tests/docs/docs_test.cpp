@@ -86,7 +86,7 @@ class Literals {
 
 Texts literalsOf(const fs::path& folder) {
   Texts all;
-  for (const auto& entry : fs::directory_iterator(folder)) {
+  for (const auto& entry : fs::recursive_directory_iterator(folder)) {
     const std::string kind = entry.path().extension();
     if (kind == ".cpp" || kind == ".h") all.merge(Literals(contents(entry.path())).found);
   }
