@@ -137,8 +137,8 @@ void AzureSSOClient::RequestKeysInfo(std::string uri, Json::Value& keys) {
   } catch (const sso_err_resp& e) {
     syslog(LOG_ERR, "%s:%d request wellknown uri %s.", kUnit, __LINE__, e.what());
   }
-  // One clean-up more than httpGet's own: it takes a reference that the host program may hold
-  // (docs/integrating.md). Programs in the field rely on what they see now, so it stays.
+  // httpGet has cleaned up already: this gives up a reference that the host program may hold
+  // (docs/integrating.md). It stays: the sequence of calls is settled behaviour.
   CleanUpCurl();
 }
 
