@@ -82,7 +82,7 @@ SPY CURLcode curl_easy_perform(CURL* handle) {
 
 SPY CURLcode curl_easy_setopt(CURL* handle, CURLoption option, ...) {
   const test::Busy busy;
-  note("setopt " + std::to_string(option));
+  note(std::string("setopt ") + curl_easy_option_by_id(option)->name);
   const auto real = next<CURLcode (*)(CURL*, CURLoption, ...)>("curl_easy_setopt");
   va_list arguments;
 #pragma GCC diagnostic push
