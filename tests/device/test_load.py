@@ -17,7 +17,7 @@ from providers.scripted import Script
 
 FULL = os.environ.get("SSOCLIENT_LOAD") == "full"
 SECONDS, RATE = (300, 10000 / 60) if FULL else (10, 10000 / 60)
-SIGN_INS, MOST_SESSIONS = (5000, 1000) if FULL else (160, 100)
+SIGN_INS, MOST_SESSIONS = (5000, 1000) if FULL else (80, 50)
 CLIENTS = 4  # connections of the one client
 MOST_DISK = 1 << 20
 
@@ -59,6 +59,11 @@ class Flood(threading.Thread):
 
 
 class Load(DeviceTest):
+    def setUp(self):
+        super().setUp()
+        for name in os.listdir(STORE + "/sessions") if os.path.isdir(STORE + "/sessions") else []:
+            os.unlink(f"{STORE}/sessions/{name}")
+
     def check_person(self, when, table):
         begun = time.monotonic()
         self.browser = self.new_browser()
