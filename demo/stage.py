@@ -21,6 +21,32 @@ WWW = QOVA + "/www"
 BUNDLE = "/etc/ssl/certs/ca-certificates.crt"
 WEB_USER = "www-data"
 
+# What RFC 5280 wants in certificates, and strict clients demand.
+AUTHORITY = """[req]
+distinguished_name = name
+x509_extensions = authority
+[name]
+[authority]
+basicConstraints = critical, CA:TRUE
+keyUsage = critical, keyCertSign, cRLSign
+subjectKeyIdentifier = hash
+authorityKeyIdentifier = keyid:always
+"""
+SERVER = """[req]
+distinguished_name = name
+x509_extensions = server
+[name]
+[server]
+subjectAltName = DNS:{name}
+basicConstraints = critical, CA:FALSE
+keyUsage = critical, digitalSignature
+extendedKeyUsage = serverAuth
+subjectKeyIdentifier = hash
+authorityKeyIdentifier = keyid:always
+"""
+NEW_KEY = ("-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes")
+
+
 class StageError(Exception):
     """Something that the demo needs is not there; the message is for the person in front of it."""
 
@@ -107,9 +133,10 @@ class Stage:
         run("mount", "--bind", FOLDER + "/etc", "/etc")
 
     def _authority(self):
-        run("openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256",
-            "-nodes", "-days", "30", "-subj", "/CN=ssoclient demo authority",
-            "-keyout", FOLDER + "/ca.key", "-out", self.authority)
+        write(FOLDER + "/ca.conf", AUTHORITY)
+        run("openssl", "req", "-x509", "-config", FOLDER + "/ca.conf", *NEW_KEY, "-days", "30",
+            "-subj", "/CN=ssoclient demo authority", "-keyout", FOLDER + "/ca.key",
+            "-out", self.authority)
         # libcurl looks nowhere else for authorities.
         with open(self.authority, encoding="ascii") as own, open(BUNDLE, "a") as bundle:
             bundle.write(own.read())
@@ -117,20 +144,20 @@ class Stage:
     def certificate(self, name):
         """Issues a certificate for a name; returns the paths of certificate and key."""
         base = f"{FOLDER}/{name}"
-        write(base + ".ext", f"subjectAltName=DNS:{name}\nextendedKeyUsage=serverAuth\n")
-        run("openssl", "req", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes",
-            "-subj", "/CN=" + name, "-keyout", base + ".key", "-out", base + ".csr")
+        write(base + ".conf", SERVER.format(name=name))
+        run("openssl", "req", "-config", base + ".conf", *NEW_KEY, "-subj", "/CN=" + name,
+            "-keyout", base + ".key", "-out", base + ".csr")
         run("openssl", "x509", "-req", "-in", base + ".csr", "-CA", self.authority, "-CAkey",
-            FOLDER + "/ca.key", "-CAcreateserial", "-days", "30", "-extfile", base + ".ext",
-            "-out", base + ".pem")
+            FOLDER + "/ca.key", "-CAcreateserial", "-days", "30", "-extfile", base + ".conf",
+            "-extensions", "server", "-out", base + ".pem")
         return base + ".pem", base + ".key"
 
     def unknown_certificate(self, name):
-        """A certificate for a name that nobody vouches for; returns the paths as certificate()."""
+        """A certificate for a name that no authority issued; returns the paths as certificate()."""
         base = f"{FOLDER}/{name}-unknown"
-        run("openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256",
-            "-nodes", "-days", "30", "-subj", "/CN=" + name, "-addext",
-            "subjectAltName=DNS:" + name, "-keyout", base + ".key", "-out", base + ".pem")
+        write(base + ".conf", SERVER.format(name=name))
+        run("openssl", "req", "-x509", "-config", base + ".conf", *NEW_KEY, "-days", "30",
+            "-subj", "/CN=" + name, "-keyout", base + ".key", "-out", base + ".pem")
         return base + ".pem", base + ".key"
 
     # -- processes -------------------------------------------------------------------------

@@ -11,7 +11,7 @@ SCREEN = {"width": 760, "height": 480, "deviceScaleFactor": 1, "mobile": False}
 
 class Visit:
     STEPS = ("device page", "provider's login page", "name and password", "relay page",
-             "back at the origin", "sign out", "signed out on the device")
+             "back at the origin", "sign out", "signed out on the device", "sign in again")
 
     def __init__(self, scene, chromium, profile, road):
         self.scene, self.profile = scene, profile
@@ -52,7 +52,7 @@ class Visit:
         self._done(f"\"{tab.title}\" at {shown(tab.url)}")
 
         self._begin()
-        tab.type(name, self.scene.person.account)
+        tab.type(name, provider.login_name)
         tab.type(password, self.scene.person.password)
         tab.press("ENTER")
         provider.agree(tab)
@@ -67,7 +67,7 @@ class Visit:
 
         self._begin()
         tab.wait(lambda: tab.url == device + "/index.cgi", "the origin")
-        expected = self.scene.expected[self.profile]
+        expected = self.scene.expected(self.profile)
         if tab.find("#user").text != expected:
             raise StepError(f"expected user {expected}, the device page says: {tab.text}")
         self._done(tab.text)
@@ -77,16 +77,30 @@ class Visit:
         provider.agree_to_leave(tab)
         if provider.comes_back:
             tab.wait(lambda: tab.title == "Signed out", "the relay page")
+            self._done(tab.text)
         else:
-            self._at(provider.url)
-        self._done(tab.text or f"an empty page at {shown(tab.url)}")
+            tab.wait(lambda: provider.goodbye in tab.text, "the provider's last page")
+            self._done(f"\"{provider.goodbye}\" on the provider's page: {provider.why_not_back}")
 
         self._begin()
         tab.open(device + "/index.cgi")
         if "Nobody is signed in." not in tab.text:
             raise StepError("the device still has a session: " + tab.text)
         self._done(tab.text)
-        say(f"{self.name}: user name {expected}")
+
+        self._begin()
+        tab.click("#sign-in")
+        tab.find(password)
+        self._done("the provider asks for the password")
+
+    def outcome(self):
+        """What happened, in one sentence."""
+        provider = self.scene.provider
+        end = "the device's page" if provider.comes_back else "the provider's page"
+        return (f"{self.name}: {self.scene.person.account} signed in at {provider.title}, was "
+                f"{self.scene.expected(self.profile)} on the device, and signed out, which ended "
+                f"on {end}; the next sign-in asks for the password")
+
 
 class Pictures:
     """Takes pictures of the pages that a person meets."""

@@ -118,7 +118,7 @@ class Checks:
             self.directory.thaw()
 
     def known(self):
-        if not self.directory.knows_user(self.scene.expected["azure"]):
+        if not self.directory.knows_user(self.scene.users["azure"]):
             raise CheckError("unknown")
         if self.directory.knows_user(f"{NETBIOS}\\nobody-there"):
             raise CheckError("it knows everybody")
@@ -151,7 +151,7 @@ def main():
 
     stage = Stage(DEVICE, PROVIDER, 8443, 8444)
     scene = Scene(stage)
-    scene.expected["azure"] = f"{NETBIOS}\\alice"
+    scene.users["azure"] = f"{NETBIOS}\\alice"
     directory = Directory(stage, DNS, NETBIOS)
     checks = Checks(scene, directory, options.convert)
     try:

@@ -60,7 +60,7 @@ class Scenario(DeviceTest):
         provider, person = self.device.provider, self.device.person
         name, secret = provider.fields
         write = self.tab.type if self.key_by_key else self.tab.paste
-        write(name, person.account)
+        write(name, provider.login_name)
         write(secret, person.password if password is None else password)
         self.tab.press("ENTER")
         provider.agree(self.tab)

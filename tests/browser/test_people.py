@@ -4,15 +4,18 @@ import time
 import unittest
 
 from device import device
+from providers.entra import Entra
 from providers.glewlwyd import Glewlwyd
 from providers.lemonldap import LemonLDAP
+from providers.liberty import Liberty
 from scenario import Scenario
 
 PHONE = {"width": 320, "height": 568, "deviceScaleFactor": 2, "mobile": True}
 
 
 class Road:
-    """From the device's page to the provider's, in, back to the origin, out."""
+    """From the device's page to the provider's, in, back to the origin, out, and up to the
+    password of the next sign-in."""
     key_by_key = True
 
     def road(self, profile):
@@ -23,9 +26,11 @@ class Road:
         if self.device.provider.comes_back:
             self.assert_out()
         else:
-            self.tab.wait(lambda: self.tab.url.startswith(self.device.provider.url),
-                          "the provider's logout")
+            self.tab.wait(lambda: self.device.provider.goodbye in self.tab.text,
+                          "the provider's last page")
             self.assert_nobody()
+        self.to_provider(profile)
+        self.tab.find(self.device.provider.fields[1])
 
     def test_azure(self):
         self.road("azure")
@@ -57,6 +62,21 @@ class OnGlewlwyd(Visited, Scenario):
 
 class OnLemonLDAP(Visited, Scenario):
     provider = LemonLDAP
+
+
+class OnEntra(Visited, Scenario):
+    provider = Entra
+    test_websphere = None
+
+    def test_azure_v1(self):
+        self.device.register("azure v1.0")
+        self.addCleanup(self.device.register, "azure v2.0")
+        self.road("azure")
+
+
+class OnLiberty(Visited, Scenario):
+    provider = Liberty
+    test_azure = None
 
 
 class AtThePage(Scenario):

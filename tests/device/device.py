@@ -48,13 +48,18 @@ class Device:
         self._register()
 
     def _register(self):
+        for title in self.provider.setups:
+            self.register(title)
+
+    def register(self, title):
+        """Sets the device's client up for one of the provider's sign-ins."""
+        name, add = self.provider.setups[title]
         address = self.stage.device
-        for name in ("azure", "websphere"):
-            client = self.clients[name] = Client(
-                "device-" + name, secrets.token_urlsafe(24) + "+/=&%'", address + self.server.login,
-                address + "/webman/ssoclient/relay.html")
-            add = {"azure": self.provider.add_azure, "websphere": self.provider.add_websphere}
-            self.stage.configure(name, settings_of(name, client, add[name](client), self.person))
+        client = self.clients[name] = Client(
+            "device-" + name, secrets.token_urlsafe(24) + "+/=&%'", address + self.server.login,
+            address + "/webman/ssoclient/relay.html")
+        endpoints = getattr(self.provider, add)(client)
+        self.stage.configure(name, settings_of(name, client, endpoints, self.person))
 
     def visit(self, provider):
         """Another provider takes the scripted one's place."""
