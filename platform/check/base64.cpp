@@ -16,7 +16,8 @@ constexpr size_t kSlack = 64;     // behind a room whose end is another line's m
 constexpr size_t kBuffer = 1024;  // the library's own
 constexpr size_t kLong = 100000;  // no limit is put on what a browser sends
 
-const std::string kAlphabet = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
+constexpr std::string_view kAlphabet =
+    "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
 
 // Bit by bit, unlike any usual encoder: it is compared with them.
 std::string Base64(const std::string& bytes) {
