@@ -77,9 +77,11 @@ class Page:
 class Browser:
     def __init__(self, authority):
         self.cookies = http.cookiejar.CookieJar()
+        context = ssl.create_default_context(cafile=authority)
+        context.verify_flags |= ssl.VERIFY_X509_STRICT  # as Python does from 3.13 on
         self._opener = urllib.request.build_opener(
             urllib.request.ProxyHandler({}),
-            urllib.request.HTTPSHandler(context=ssl.create_default_context(cafile=authority)),
+            urllib.request.HTTPSHandler(context=context),
             urllib.request.HTTPCookieProcessor(self.cookies), _Stay())
 
     def get(self, url, headers=None):

@@ -11,22 +11,27 @@ import sys
 
 import forward
 from browser import BrowserError
+from providers.entra import Entra
 from providers.glewlwyd import Glewlwyd
 from providers.lemonldap import LemonLDAP
+from providers.liberty import Liberty
 from scene import DEVICE, PROVIDER, Scene, StepError, say, show_logs
 from stage import Stage, StageError
 
-PROVIDERS = {"glewlwyd": Glewlwyd, "lemonldap": LemonLDAP}
+PROVIDERS = {"glewlwyd": Glewlwyd, "lemonldap": LemonLDAP, "entra": Entra, "liberty": Liberty}
 
 
 def serve(scene, profile, sockets):
-    scene.choose(profile)
+    titles = [title for title, setup in scene.provider.setups.items() if setup[0] == profile]
+    if not titles:
+        raise StageError(f"{scene.provider.title} has no sign-in for the profile {profile}")
+    scene.choose(titles[-1])
     forward.start(sockets)
     person = scene.person
     print(f"""
-The demo is running; profile "{profile}".
+The demo is running; sign-in "{titles[-1]}".
   Open        {scene.stage.device}/
-  Name        {person.account}
+  Name        {scene.provider.login_name}
   Password    {person.password}
 Both servers' certificates come from an authority made for this run: your browser will warn,
 once for the device and once for the provider ({scene.provider.url}/).
@@ -43,19 +48,21 @@ Ctrl-C ends it.
 
 
 def visits(scene, pictures):
-    """Signs in and out with each client, on each road; each step says what was seen."""
+    """Signs in and out with each client; each step says what was seen."""
     from chromium import Chromium  # not needed, and not there, where somebody else's browser serves
     from visit import Pictures, Visit
     say("browser: Chromium, without a window")
+    done = []
     with contextlib.closing(Chromium(scene.stage)) as chromium:
-        for road in ("plain", "checked"):
-            scene.use_road(road)
-            for profile in ("azure", "websphere"):
-                scene.choose(profile)
-                Visit(scene, chromium, profile, road).run()
+        for title in scene.provider.setups:
+            scene.choose(title)
+            visit = Visit(scene, chromium, title)
+            visit.run()
+            done.append(visit.outcome())
         if pictures:
             Pictures(scene, chromium, pictures).take()
-    say("all sign-ins succeeded")
+    say("all sign-ins succeeded:")
+    print("\n".join("  " + line for line in done), flush=True)
 
 
 def read_options():

@@ -67,17 +67,20 @@ class Scene:
     def __init__(self, stage, provider=Glewlwyd):
         self.stage = stage
         self.person = Person("alice", secrets.token_urlsafe(9), "alice@plant7.example.net", {
-            "tid": "3f2a8f6e-demo-tenant", "unique_name": "alice@plant7.example.net"})
+            "tid": "3f2a8f6e-5b1c-4d7e-9a60-2c4e8d10b7f5",
+            "unique_name": "alice@plant7.example.net"})
         self.provider = provider(stage, self.person)
         self.server = None
-        self.expected = {"azure": "PLANT7.EXAMPLE.NET\\alice", "websphere": "alice"}
+        self.settings = {}
+        self.users = {"azure": "PLANT7.EXAMPLE.NET\\alice", "websphere": "alice"}
 
     def set_up(self, prefix, programs, pages):
         say("device: private names, certificate authority, system log")
         self.stage.build()
         say(f"device: library, login program (set-id root), web server on {self.stage.device}")
         self.stage.install(prefix, programs, pages)
-        self.use_road("checked")
+        self.server = Lighttpd(self.stage)
+        self.server.start({})
         say(f"provider: {self.provider.title} on {self.provider.url}")
         self.provider.start()
         self._clients()
@@ -88,20 +91,22 @@ class Scene:
                       self.stage.device + "/webman/ssoclient/relay.html")
 
     def _clients(self):
-        for name, add in (("azure", self.provider.add_azure),
-                          ("websphere", self.provider.add_websphere)):
-            client = self._client(name)
-            self.stage.configure(name, settings_of(name, client, add(client), self.person))
+        """Registers one client per profile, and keeps the settings of each sign-in."""
+        clients = {}
+        for title, (profile, add) in self.provider.setups.items():
+            client = clients.setdefault(profile, self._client(profile))
+            endpoints = getattr(self.provider, add)(client)
+            self.settings[title] = settings_of(profile, client, endpoints, self.person)
 
-    def choose(self, profile):
+    def choose(self, title):
+        """Sets the device up for one of the provider's sign-ins."""
+        profile = self.provider.setups[title][0]
+        self.stage.configure(profile, self.settings[title])
         self.stage.configure("profile", {"sso_enable": True, "sso_profile": profile}, 0o644)
 
-    def use_road(self, road, **environment):
-        """Plain: the login program calls OIDCLogin. Checked: it also compares the nonce."""
-        if self.server is not None:
-            self.server.stop()
-        self.server = Lighttpd(self.stage)
-        self.server.start({"SSO_LOGIN_ROAD": road, **environment})
+    def expected(self, title):
+        """The name under which the user is then signed in on the device."""
+        return self.users[self.provider.setups[title][0]]
 
 
 def show_logs(stage):

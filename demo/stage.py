@@ -21,6 +21,32 @@ WWW = QOVA + "/www"
 BUNDLE = "/etc/ssl/certs/ca-certificates.crt"
 WEB_USER = "www-data"
 
+# What RFC 5280 wants in certificates, and strict clients demand.
+AUTHORITY = """[req]
+distinguished_name = name
+x509_extensions = authority
+[name]
+[authority]
+basicConstraints = critical, CA:TRUE
+keyUsage = critical, keyCertSign, cRLSign
+subjectKeyIdentifier = hash
+authorityKeyIdentifier = keyid:always
+"""
+SERVER = """[req]
+distinguished_name = name
+x509_extensions = server
+[name]
+[server]
+subjectAltName = DNS:{name}
+basicConstraints = critical, CA:FALSE
+keyUsage = critical, digitalSignature
+extendedKeyUsage = serverAuth
+subjectKeyIdentifier = hash
+authorityKeyIdentifier = keyid:always
+"""
+NEW_KEY = ("-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes")
+
+
 class StageError(Exception):
     """Something that the demo needs is not there; the message is for the person in front of it."""
 
@@ -44,17 +70,32 @@ def write(path, text, mode=0o644):
 class SystemLog:
     """Reads /dev/log as a syslog daemon would and keeps the lines."""
 
+    MARK = "<14>mark"
+
     def __init__(self, path="/dev/log"):
         self.lines = []
         self._socket = socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM)
         self._socket.bind(path)
         os.chmod(path, 0o666)
+        self._path = path
+        self._marked = threading.Event()
         threading.Thread(target=self._read, daemon=True).start()
 
     def _read(self):
         while True:
             line = self._socket.recv(65536).decode("utf-8", "replace").rstrip("\0\n")
-            self.lines.append(line)
+            if line == self.MARK:
+                self._marked.set()
+            else:
+                self.lines.append(line)
+
+    def catch_up(self):
+        """Waits until all that was sent before is in `lines`."""
+        self._marked.clear()
+        with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as end:
+            end.sendto(self.MARK.encode(), self._path)
+        if not self._marked.wait(30):
+            raise StageError("the system log is not read")
 
 
 class Stage:
@@ -107,9 +148,10 @@ class Stage:
         run("mount", "--bind", FOLDER + "/etc", "/etc")
 
     def _authority(self):
-        run("openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256",
-            "-nodes", "-days", "30", "-subj", "/CN=ssoclient demo authority",
-            "-keyout", FOLDER + "/ca.key", "-out", self.authority)
+        write(FOLDER + "/ca.conf", AUTHORITY)
+        run("openssl", "req", "-x509", "-config", FOLDER + "/ca.conf", *NEW_KEY, "-days", "30",
+            "-subj", "/CN=ssoclient demo authority", "-keyout", FOLDER + "/ca.key",
+            "-out", self.authority)
         # libcurl looks nowhere else for authorities.
         with open(self.authority, encoding="ascii") as own, open(BUNDLE, "a") as bundle:
             bundle.write(own.read())
@@ -117,20 +159,20 @@ class Stage:
     def certificate(self, name):
         """Issues a certificate for a name; returns the paths of certificate and key."""
         base = f"{FOLDER}/{name}"
-        write(base + ".ext", f"subjectAltName=DNS:{name}\nextendedKeyUsage=serverAuth\n")
-        run("openssl", "req", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes",
-            "-subj", "/CN=" + name, "-keyout", base + ".key", "-out", base + ".csr")
+        write(base + ".conf", SERVER.format(name=name))
+        run("openssl", "req", "-config", base + ".conf", *NEW_KEY, "-subj", "/CN=" + name,
+            "-keyout", base + ".key", "-out", base + ".csr")
         run("openssl", "x509", "-req", "-in", base + ".csr", "-CA", self.authority, "-CAkey",
-            FOLDER + "/ca.key", "-CAcreateserial", "-days", "30", "-extfile", base + ".ext",
-            "-out", base + ".pem")
+            FOLDER + "/ca.key", "-CAcreateserial", "-days", "30", "-extfile", base + ".conf",
+            "-extensions", "server", "-out", base + ".pem")
         return base + ".pem", base + ".key"
 
     def unknown_certificate(self, name):
-        """A certificate for a name that nobody vouches for; returns the paths as certificate()."""
+        """A certificate for a name that no authority issued; returns the paths as certificate()."""
         base = f"{FOLDER}/{name}-unknown"
-        run("openssl", "req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256",
-            "-nodes", "-days", "30", "-subj", "/CN=" + name, "-addext",
-            "subjectAltName=DNS:" + name, "-keyout", base + ".key", "-out", base + ".pem")
+        write(base + ".conf", SERVER.format(name=name))
+        run("openssl", "req", "-x509", "-config", base + ".conf", *NEW_KEY, "-days", "30",
+            "-subj", "/CN=" + name, "-keyout", base + ".key", "-out", base + ".pem")
         return base + ".pem", base + ".key"
 
     # -- processes -------------------------------------------------------------------------
@@ -204,9 +246,7 @@ class Stage:
         for name in os.listdir(pages):
             shutil.copy(f"{pages}/{name}", WWW + "/webman/ssoclient")
         self.install_login(programs + "/login.cgi", WWW + "/webman/login.cgi", 0o4750)
-        entry = pwd.getpwnam(WEB_USER)
-        os.makedirs("/run/ssoclient", 0o700)
-        os.chown("/run/ssoclient", entry.pw_uid, entry.pw_gid)
+        self.set_options()
 
     @staticmethod
     def install_login(source, target, mode):
@@ -220,6 +260,12 @@ class Stage:
         """Makes the device's library folder known: a set-id program has no LD_LIBRARY_PATH."""
         write("/etc/ld.so.conf.d/qova.conf", QOVA + "/lib\n")
         run("ldconfig", "-X")
+
+    @staticmethod
+    def set_options(**values):
+        """Writes the login program's own settings; what is not given keeps its default."""
+        write(SETTINGS + "/login.conf", "# Written by the demo.\n" + "".join(
+            f"{key} = {value}\n" for key, value in values.items()))
 
     def configure(self, name, values, mode=0o600):
         """Writes one of the device's three settings files."""

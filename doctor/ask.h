@@ -12,7 +12,7 @@
 #include <string>
 #include <vector>
 
-#include "doctor/report.h"
+#include "doctor/finding.h"
 
 namespace doctor {
 
@@ -34,7 +34,7 @@ struct Reply {
   std::string Thrown() const;
   std::string ThrownClass() const;
   bool Threw(const std::string& text) const { return Thrown() == text; }
-  // The log lines that tell of an error.
+  // The log lines that report an error.
   std::vector<Said> ErrorLines() const;
 };
 

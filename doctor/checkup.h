@@ -1,5 +1,5 @@
-// The checks of the doctor, one function per topic, in the order in which they run. Each adds its
-// findings to the report and leaves what later ones need in the checkup.
+// The checks of the doctor, one function per topic, in the order in which main runs them. Each
+// adds its findings to the report and leaves what later ones need in the checkup.
 #pragma once
 
 #include <ctime>
@@ -24,12 +24,26 @@ struct Checkup {
 
   std::optional<Caller> caller;         // the login program's identity, if it was named
   Provider provider = Provider::kNone;  // of the profile file, whether sign-on is on or not
-  bool settings_read = false;           // the provider's file could be read and is of use
+  bool settings_read = false;           // the provider's file could be read and used
+  std::string settings_file;
   Settings settings;
-  std::set<std::string> bad_urls;  // not worth a request
+  std::set<std::string> bad_urls;  // not worth a request: there is a finding
   std::string tenant;              // the library has no accessor for it
+  std::string network_obstacle;    // the finding that kept the key set away
   std::string issuer;              // of the discovery document
   Json::Value key_set;
+
+  bool azure() const { return provider == Provider::kAzure; }
+  // The settings key with the provider's prefix, and where it is.
+  std::string Key(const std::string& name) const {
+    return (azure() ? "azure_" : "websphere_") + name;
+  }
+  // False if there is a finding about the URL already.
+  bool IsWorthRequest(const std::string& url) const {
+    return !url.empty() && bad_urls.count(url) == 0;
+  }
+  Place At(const std::string& name) const { return {settings_file, Key(name)}; }
+
   struct ServerTime {
     std::string server;
     time_t theirs;
@@ -38,7 +52,7 @@ struct Checkup {
   std::vector<ServerTime> server_times;
 };
 
-// identity.cpp: who the login program is, and whether the guard can raise its ids.
+// identity.cpp: who the login program is, and that the guard can raise its ids.
 void FindCaller(Checkup& checkup);
 void CheckIdentity(Checkup& checkup);
 

@@ -6,6 +6,7 @@
 #include <ctime>
 
 #include "doctor/json.h"
+#include "doctor/redact.h"
 #include "doctor/text.h"
 
 namespace doctor {
@@ -51,6 +52,14 @@ std::string MakeSignedToken(const Json::Value& header, const Json::Value& claims
     return MakeToken(header, claims);
   }
   return input + "." + EncodeBase64Url(std::string(reinterpret_cast<char*>(mac), length));
+}
+
+std::string Seen(const Json::Value& claims, const char* name) {
+  const std::string subject = Quote(name) + " of the token is ";
+  if (!claims.isObject() || !claims.isMember(name)) return subject + "missing";
+  const Json::Value& value = claims[name];
+  if (!value.isConvertibleTo(Json::stringValue)) return subject + TypeName(value);
+  return subject + Quote(Shown(value.asString(), 100));
 }
 
 }  // namespace doctor

@@ -21,4 +21,7 @@ std::string MakeToken(const Json::Value& header, const Json::Value& claims);
 std::string MakeSignedToken(const Json::Value& header, const Json::Value& claims,
                             const std::string& secret);
 
+// A claim or header member as it is shown: "aud" of the token is ...
+std::string Seen(const Json::Value& claims, const char* name);
+
 }  // namespace doctor

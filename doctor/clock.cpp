@@ -14,6 +14,7 @@ constexpr time_t kLongAgo = 1704067200;
 constexpr long long kTolerable = 60;
 // ID tokens commonly live for one hour.
 constexpr long long kTokenLife = 3600;
+constexpr char kSetClock[] = "Set the clock, best with a time service (NTP): date -u; timedatectl";
 
 std::vector<Said> Expired(const Checkup& checkup, long long ahead) {
   Json::Value claims = GoodClaims(checkup);
@@ -23,43 +24,30 @@ std::vector<Said> Expired(const Checkup& checkup, long long ahead) {
 
 void Compare(Checkup& checkup, const Checkup::ServerTime& times) {
   const long long ahead = static_cast<long long>(times.ours) - times.theirs;
-  const std::string remedy = "Set the clock, best by a time service (NTP).";
-  const std::string seen = "this device's clock is " + Span(ahead) +
-                           (ahead > 0 ? " ahead of " : " behind ") + "that of " + times.server;
+  const std::string cause = "This device's clock is " + Span(ahead) +
+                            (ahead > 0 ? " ahead of " : " behind ") + "that of " + times.server;
   if (ahead >= kTokenLife) {
     checkup.report.Add(
-        {"clock-ahead", Severity::kFailure, "clock", seen, Expired(checkup, ahead), remedy});
+        {"clock-ahead", Grade::kFailure, cause, {}, kSetClock, Expired(checkup, ahead)});
   } else if (ahead > kTolerable) {
-    checkup.report.Add({"clock-ahead",
-                        Severity::kWarning,
-                        "clock",
-                        seen,
-                        {Said::Does("takes tokens for expired by so much too early")},
-                        remedy});
+    checkup.report.Warn("clock-ahead", cause, {}, kSetClock,
+                        {Said::Does("treats tokens as expired that much too early")});
   } else if (ahead < -kTolerable) {
-    checkup.report.Add({"clock-behind",
-                        Severity::kWarning,
-                        "clock",
-                        seen,
-                        {Said::Does("takes tokens by so much longer than they are meant to live")},
-                        remedy});
+    checkup.report.Warn("clock-behind", cause, {}, kSetClock,
+                        {Said::Does("accepts tokens for that much too long")});
   } else {
-    checkup.report.Ok("clock", "clock", Time(times.ours) + ", like that of " + times.server);
+    checkup.report.Good("clock", Time(times.ours) + ", like that of " + times.server);
   }
 }
 
 }  // namespace
 
 void CheckClock(Checkup& checkup) {
-  checkup.report.Begin("Clock");
   const time_t now = time(nullptr);
   if (now < kLongAgo) {
-    checkup.report.Add({"clock-unset",
-                        Severity::kFailure,
-                        "clock",
-                        "it is " + Time(now) + " on this device",
-                        {Said::Does("finds the server's certificate not yet valid")},
-                        "Set the clock, best by a time service (NTP)."});
+    checkup.report.Fail("clock-unset", "This device's clock was never set: it says " + Time(now),
+                        {}, kSetClock,
+                        {Said::Does("finds the server's certificate not yet valid")});
     return;
   }
   const Checkup::ServerTime* worst = nullptr;
@@ -72,7 +60,7 @@ void CheckClock(Checkup& checkup) {
   if (worst != nullptr) {
     Compare(checkup, *worst);
   } else {
-    checkup.report.Note("clock", "clock", Time(now) + "; no server to compare it with");
+    checkup.report.Good("clock", Time(now) + "; no server to compare it with");
   }
 }
 

@@ -16,11 +16,7 @@ constexpr char kLogout[] = "the URL of the provider's end-session endpoint";
 constexpr char kWellknown[] =
     "the URL of the discovery document (.../.well-known/openid-configuration)";
 
-bool EndsWith(const std::string& text, const std::string& end) {
-  return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
-}
-
-// The checks of a token that is in order but for one claim.
+// The checks of a token with one wrong claim.
 std::vector<Said> VerifyAnother(const Checkup& checkup, const char* claim) {
   Json::Value claims = GoodClaims(checkup);
   claims[claim] = "of another";
@@ -85,15 +81,16 @@ std::vector<Said> WithoutKey(const Checkup& checkup, const Key& key) {
     return checkup.library.Verify(MakeToken(GoodHeader(checkup), GoodClaims(checkup))).said;
   }
   if (EndsWith(name, "_authorization_endpoint")) {
-    return {Said::Does("sends the browser to a URL that begins with \"?\": back to the device")};
+    return {Said::Does(
+        "sends the browser to a URL that begins with \"?\", which is the device itself")};
   }
   if (EndsWith(name, "_redirect_uri")) {
     return {Said::Does("sends an empty redirect_uri, which the provider refuses")};
   }
   if (EndsWith(name, "_logout_endpoint")) {
-    return {Said::Does("answers an empty logout endpoint; nobody is signed out at the provider")};
+    return {Said::Does("returns an empty logout endpoint; no user is signed out at the provider")};
   }
-  return {Said::Does("signs users in all the same; isEnable() tells programs that it is off")};
+  return {Said::Does("signs users in anyway; isEnable() returns false")};
 }
 
 }  // namespace doctor

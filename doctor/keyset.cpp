@@ -4,9 +4,9 @@
 
 #include "doctor/claims.h"
 #include "doctor/json.h"
+#include "doctor/redact.h"
 #include "doctor/text.h"
 #include "doctor/transfer.h"
-#include "doctor/web.h"
 
 namespace doctor {
 
@@ -14,24 +14,26 @@ namespace {
 
 constexpr size_t kShortestModulus = 256;  // bytes; RFC 7518, section 3.3
 
+Json::Value KeysOf(const Json::Value& set) {
+  return set.isObject() && set["keys"].isArray() ? set["keys"] : Json::Value(Json::arrayValue);
+}
+
 class KeySetCheck {
  public:
   explicit KeySetCheck(Checkup& checked) : checkup(checked) {}
 
   std::string Run(const std::string& uri) {
-    const WebAnswer answer = Fetch(uri, nullptr, checkup.options.timeout);
-    if (!ReportTransfer(checkup, {"key set", uri, Severity::kFailure, [this] { return Ask(); }},
-                        answer)) {
-      return "";
-    }
+    WebAnswer answer;
+    const Destination destination{"key set", uri, Grade::kFailure, [this] { return Ask(); }};
+    if (!Exchange(checkup, destination, nullptr, answer)) return "";
+    place = At(destination, answer);
     if (!CheckDocument(answer)) return "";
     for (const Json::Value& key : checkup.key_set["keys"]) CheckKey(key);
     if (usable.empty()) {
-      Fail(
-          "keys-none-usable",
-          std::to_string(checkup.key_set["keys"].size()) +
-              " keys, none of them with \"kid\", \"n\" and \"e\" as texts",
-          "Let the provider publish RSA keys, and look at \"jwks_uri\" of its discovery document.");
+      Fail("keys-none-usable",
+           "None of the " + std::to_string(checkup.key_set["keys"].size()) +
+               " keys has \"kid\", \"n\" and \"e\" as strings",
+           "Let the provider publish RSA keys, and check \"jwks_uri\" of its discovery document.");
       return "";
     }
     AddGood();
@@ -46,30 +48,31 @@ class KeySetCheck {
     return checkup.library.Verify(MakeToken(header, GoodClaims(checkup))).said;
   }
 
-  void Fail(const char* id, const std::string& seen, const std::string& remedy) {
-    checkup.report.Add({id, Severity::kFailure, "key set", seen, Ask(), remedy});
+  void Fail(const char* id, const std::string& cause, const std::string& action) {
+    checkup.report.Fail(id, cause, place, action, Ask());
   }
 
-  void Warn(const char* id, const std::string& seen, const std::string& does,
-            const std::string& remedy) {
-    checkup.report.Add({id, Severity::kWarning, "key set", seen, {Said::Does(does)}, remedy});
+  void Warn(const char* id, const std::string& cause, const std::string& does,
+            const std::string& action) {
+    checkup.report.Warn(id, cause, place, action, {Said::Does(does)});
   }
 
   bool CheckDocument(const WebAnswer& answer) {
-    const std::string shown = "HTTP " + std::to_string(answer.status);
-    const std::string remedy = "Look at \"jwks_uri\" of the provider's discovery document.";
+    const std::string shown = " (HTTP " + std::to_string(answer.status) + ")";
+    const std::string action = "Check \"jwks_uri\" of the provider's discovery document.";
     Json::Value& document = checkup.key_set;
     if (!ParseJson(answer.body, document)) {
       document = Json::Value();
-      Fail("keys-no-json", shown + ", not JSON", remedy);
+      Fail("keys-no-json", "The key set is not JSON" + shown, action);
       return false;
     }
     if (!document.isObject() || !document.isMember("keys")) {
-      Fail("keys-missing", shown + ", JSON without \"keys\"", remedy);
+      Fail("keys-missing", "The key set has no \"keys\"" + shown, action);
       return false;
     }
     if (!document["keys"].isArray()) {
-      Fail("keys-no-list", "\"keys\" is " + TypeName(document["keys"]) + ", not a list", remedy);
+      Fail("keys-no-list",
+           "\"keys\" of the key set is " + TypeName(document["keys"]) + ", not a list", action);
       return false;
     }
     return true;
@@ -78,39 +81,40 @@ class KeySetCheck {
   void CheckKey(const Json::Value& key) {
     if (!key.isObject() || !key.isMember("kid")) return;  // the library skips it
     if (!key["kid"].isConvertibleTo(Json::stringValue)) {
-      Fail("keys-bad-kid", "a key has " + TypeName(key["kid"]) + " as its \"kid\"",
-           "Let the provider publish key identifiers that are texts.");
+      Fail("keys-bad-kid", "A key has " + TypeName(key["kid"]) + " as its \"kid\"",
+           "Let the provider publish key identifiers that are strings.");
       return;
     }
     const std::string kid = key["kid"].asString();
     if (met.empty()) first = kid;
     if (!met.insert(kid).second) {
-      Warn("keys-same-kid", "two keys are called " + Quote(Clip(kid, 60)),
-           "uses the first of them, whatever signed the token",
-           "Let the provider give each key an identifier of its own.");
+      Warn("keys-same-kid", "Two keys have the identifier " + Quote(Shown(kid, 60)),
+           "uses the first of them, whichever signed the token",
+           "Let the provider give each key its own identifier.");
       return;
     }
     if (!IsUsableKey(key)) {
-      other += (other.empty() ? "" : ", ") + Clip(kid, 60);
+      other += (other.empty() ? "" : ", ") + Shown(kid, 60);
       return;
     }
     usable.insert(kid);
     const std::string modulus = DecodeBase64Url(StringOf(key, "n"));
     if (modulus.size() < kShortestModulus) {
       Warn("keys-short",
-           "the key " + Quote(Clip(kid, 60)) + " has " + std::to_string(modulus.size() * 8) +
+           "The key " + Quote(Shown(kid, 60)) + " has only " + std::to_string(modulus.size() * 8) +
                " bits",
-           "takes keys of any length", "Let the provider use RSA keys of 2048 bits or more.");
+           "accepts keys of any length", "Let the provider use RSA keys of 2048 bits or more.");
     }
   }
 
   void AddGood() const {
-    std::string text = std::to_string(usable.size()) + " RSA keys of use";
-    if (!other.empty()) text += "; of no use to the library: " + Clip(other, 200);
-    checkup.report.Ok("keys", "key set", text);
+    std::string text = Plural(usable.size(), "RSA key") + " that the library can use";
+    if (!other.empty()) text += "; it cannot use " + Clip(other, 200);
+    checkup.report.Good("keys", text, place);
   }
 
   Checkup& checkup;
+  Place place;
   std::string first;
   std::set<std::string> met;
   std::set<std::string> usable;
@@ -124,8 +128,21 @@ bool IsUsableKey(const Json::Value& key) {
          !DecodeBase64Url(StringOf(key, "e")).empty();
 }
 
+Json::Value AnyUsableKey(const Json::Value& key_set) {
+  for (const Json::Value& key : KeysOf(key_set)) {
+    if (IsUsableKey(key) && !StringOf(key, "kid").empty()) return key;
+  }
+  return {};
+}
+
+Json::Value KeyNamed(const Json::Value& key_set, const std::string& kid) {
+  for (const Json::Value& key : KeysOf(key_set)) {
+    if (key.isObject() && key.isMember("kid") && TextOf(key, "kid") == kid) return key;
+  }
+  return {};
+}
+
 std::string CheckKeySet(Checkup& checkup, const std::string& uri) {
-  checkup.report.Begin("Key set");
   return KeySetCheck(checkup).Run(uri);
 }
 

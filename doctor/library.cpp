@@ -29,9 +29,8 @@ class QuietAzureClient : public AzureSSOClient {
   void RequestWellknownInfo(Json::Value&) override {}
 };
 
-// Calls `use` with a new client of the provider, as its own type.
-template <typename Use>
-Json::Value WithClient(Provider provider, Use use) {
+// Calls `use` with a new client of the provider.
+Json::Value WithClient(Provider provider, const std::function<Json::Value(SSOClient&)>& use) {
   if (provider == Provider::kAzure) {
     AzureSSOClient client;
     return use(client);
@@ -79,28 +78,27 @@ Provider ProviderOf(const std::string& profile) {
   return Provider::kNone;
 }
 
-Reply Library::ReadSettings(Settings& settings, const Caller* caller) const {
-  const Reply reply = Ask(
-      [this] {
-        return WithClient(provider, [](SSOClient& client) {
-          Json::Value values(Json::objectValue);
-          values["client_id"] = client.GetClientID();
-          values["client_secret"] = client.GetClientSecret();
-          values["redirect_uri"] = client.GetRedirectURI();
-          values["authorization_endpoint"] = client.GetAuthEndpoint();
-          values["token_endpoint"] = client.GetTokenEndpoint();
-          values["logout_endpoint"] = client.GetLogoutEndpoint();
-          values["wellknown"] = client.GetWellknownEndpoint();
-          return values;
-        });
-      },
-      seconds, caller);
-  settings = {
-      StringOf(reply.result, "client_id"),      StringOf(reply.result, "client_secret"),
-      StringOf(reply.result, "redirect_uri"),   StringOf(reply.result, "authorization_endpoint"),
-      StringOf(reply.result, "token_endpoint"), StringOf(reply.result, "logout_endpoint"),
-      StringOf(reply.result, "wellknown")};
-  return reply;
+Reply Library::AskClient(const std::function<Json::Value(SSOClient&)>& question) const {
+  return Ask([&] { return WithClient(provider, question); }, seconds);
+}
+
+Settings Library::ReadSettings() const {
+  const Reply reply = AskClient([](SSOClient& client) {
+    Json::Value values(Json::objectValue);
+    values["client_id"] = client.GetClientID();
+    values["client_secret"] = client.GetClientSecret();
+    values["redirect_uri"] = client.GetRedirectURI();
+    values["authorization_endpoint"] = client.GetAuthEndpoint();
+    values["token_endpoint"] = client.GetTokenEndpoint();
+    values["logout_endpoint"] = client.GetLogoutEndpoint();
+    values["wellknown"] = client.GetWellknownEndpoint();
+    return values;
+  });
+  const auto value = [&reply](const char* name) { return StringOf(reply.result, name); };
+  return {value("client_id"),      value("client_secret"),
+          value("redirect_uri"),   value("authorization_endpoint"),
+          value("token_endpoint"), value("logout_endpoint"),
+          value("wellknown")};
 }
 
 Reply Library::Login(const Caller* caller) const {
@@ -132,45 +130,15 @@ Reply Library::Profile(const Caller* caller) const {
 }
 
 Reply Library::TokenRequest(const std::string& body) const {
-  return Ask(
-      [this, body] {
-        return WithClient(provider, [&](SSOClient& client) { return Exchange(client, body); });
-      },
-      seconds);
+  return AskClient([&body](SSOClient& client) { return Exchange(client, body); });
 }
 
 std::string Library::ExchangeBody() const {
-  const Reply reply = Ask(
-      [this] {
-        return WithClient(provider, [](SSOClient& client) {
-          client.SetCode("ssoclient-doctor");
-          return Json::Value(client.GetIDTokenReqParams());
-        });
-      },
-      seconds);
+  const Reply reply = AskClient([](SSOClient& client) {
+    client.SetCode("ssoclient-doctor");
+    return Json::Value(client.GetIDTokenReqParams());
+  });
   return reply.result.isString() ? reply.result.asString() : "";
-}
-
-Reply Library::Discovery() const {
-  return Ask(
-      [this] {
-        return WithClient(provider, [](SSOClient& client) {
-          Json::Value document;
-          client.RequestWellknownInfo(document);
-          return document;
-        });
-      },
-      seconds);
-}
-
-Reply Library::KeySet(const std::string& uri) const {
-  return Ask(
-      [uri] {
-        Json::Value keys;
-        AzureSSOClient().RequestKeysInfo(uri, keys);
-        return keys;
-      },
-      seconds);
 }
 
 Reply Library::Split(const std::string& token) const {
@@ -186,15 +154,11 @@ Reply Library::Body(const std::string& token) const {
 }
 
 Reply Library::Verify(const std::string& token) const {
-  return Ask(
-      [this, token] {
-        return WithClient(provider, [&](SSOClient& client) {
-          Store(client, token);
-          client.VerifyIDToken();
-          return Json::Value(true);
-        });
-      },
-      seconds);
+  return AskClient([&token](SSOClient& client) {
+    Store(client, token);
+    client.VerifyIDToken();
+    return Json::Value(true);
+  });
 }
 
 Reply Library::VerifyOffline(const std::string& token) const {
@@ -233,16 +197,12 @@ Reply Library::VerifyHMAC(const std::string& token, const std::string& secret,
 }
 
 Reply Library::UserName(const std::string& token) const {
-  return Ask(
-      [this, token] {
-        return WithClient(provider, [&](SSOClient& client) {
-          Store(client, token);
-          std::string user;
-          client.GetUserName(user);
-          return Json::Value(user);
-        });
-      },
-      seconds);
+  return AskClient([&token](SSOClient& client) {
+    Store(client, token);
+    std::string user;
+    client.GetUserName(user);
+    return Json::Value(user);
+  });
 }
 
 }  // namespace doctor

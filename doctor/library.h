@@ -3,9 +3,11 @@
 
 #include <json/value.h>
 
+#include <functional>
 #include <string>
 
 #include "doctor/ask.h"
+#include "sso/sso.h"
 
 namespace doctor {
 
@@ -31,8 +33,7 @@ class Library {
 
   void Choose(Provider chosen) { provider = chosen; }
 
-  // The settings; what the guard logged is in the reply.
-  Reply ReadSettings(Settings& settings, const Caller* caller = nullptr) const;
+  Settings ReadSettings() const;
 
   // OIDCLogin, for a profile file that keeps it from going on to the provider. With any other it
   // is not called and nothing is thrown: it would send the client secret.
@@ -47,8 +48,6 @@ class Library {
   // The body of a code exchange, client secret included, with a code that no provider gave out.
   std::string ExchangeBody() const;
 
-  Reply Discovery() const;                       // the result is the document
-  Reply KeySet(const std::string& uri) const;    // Azure; the result is the key set
   Reply Split(const std::string& token) const;   // Jwt: {"header", "body", "signature"}
   Reply Header(const std::string& token) const;  // Jwt::GetHeader
   Reply Body(const std::string& token) const;    // Jwt::GetBody
@@ -67,6 +66,9 @@ class Library {
   Reply UserName(const std::string& token) const;  // GetUserName; the result is the name
 
  private:
+  // Asks a new client of the provider.
+  Reply AskClient(const std::function<Json::Value(QOVA::SSO::SSOClient&)>& question) const;
+
   int seconds;
   Provider provider = Provider::kNone;
 };

@@ -1,32 +1,69 @@
-// ssoclient-doctor: tells an administrator what the single sign-on of a device will do, and why a
-// login would fail.
+// ssoclient-doctor: finds out why users cannot sign in to this device, and what to do about it.
 #include <csignal>
 #include <cstdio>
 #include <exception>
 #include <iostream>
 
 #include "doctor/checkup.h"
+#include "doctor/explain.h"
 #include "doctor/options.h"
+#include "doctor/redact.h"
 #include "doctor/report.h"
+#include "doctor/terminal.h"
+#include "doctor/text.h"
 
 namespace {
 
 constexpr int kWrongUsage = 2;
+constexpr int kNotChecked = 3;
+
+struct Check {
+  const char* topic;
+  void (*run)(doctor::Checkup&);
+};
+
+// In the order of a sign-in.
+constexpr Check kChecks[] = {
+    {"Files", doctor::CheckFiles},       {"Identity", doctor::CheckIdentity},
+    {"Settings", doctor::CheckSettings}, {"Network", doctor::CheckEndpoints},
+    {"Clock", doctor::CheckClock},       {"User name", doctor::CheckName},
+    {"Token", doctor::CheckToken}};
+
+// A check that ends early is a finding; the others still run.
+void Run(const Check& check, doctor::Checkup& checkup) {
+  checkup.report.Begin(check.topic);
+  doctor::Progress(std::string("Checking: ") + check.topic);
+  try {
+    check.run(checkup);
+  } catch (const std::exception& e) {
+    checkup.report.Add({"check-failed",
+                        doctor::Grade::kUnchecked,
+                        "This check ended early: " + doctor::Shown(e.what(), 200),
+                        {},
+                        "Free memory and processes on the device and try again."});
+  }
+}
 
 int Examine(const doctor::Options& options) {
   doctor::Report report;
   doctor::Checkup checkup(options, report);
   doctor::FindCaller(checkup);
-  doctor::CheckFiles(checkup);
-  doctor::CheckIdentity(checkup);
-  doctor::CheckSettings(checkup);
-  doctor::CheckEndpoints(checkup);
-  doctor::CheckClock(checkup);
-  doctor::CheckName(checkup);
-  doctor::CheckToken(checkup);
-  options.json ? report.PrintJson() : report.PrintText();
+  for (const Check& check : kChecks) Run(check, checkup);
+  doctor::Progress("");
+  options.json ? doctor::PrintJson(report) : doctor::PrintText(report, options.verbose);
   std::cout.flush();
-  return std::cout ? report.ExitStatus() : kWrongUsage;
+  return std::cout ? report.ExitStatus() : kNotChecked;
+}
+
+// What keeps the doctor from its work, on one line or in JSON.
+int GiveUp(const doctor::Options& options, const std::string& why, int status) {
+  if (options.json) {
+    doctor::PrintJsonError(why, status);
+  } else {
+    std::cerr << "ssoclient-doctor: " << doctor::Printable(doctor::Clean(why))
+              << (status == kWrongUsage ? " (try --help)\n" : "\n");
+  }
+  return status;
 }
 
 }  // namespace
@@ -34,18 +71,13 @@ int Examine(const doctor::Options& options) {
 int main(int argc, char** argv) {
   std::signal(SIGPIPE, SIG_IGN);
   doctor::Options options;
-  switch (doctor::ParseOptions(argc, argv, options)) {
-    case doctor::Usage::kDone:
-      return 0;
-    case doctor::Usage::kWrong:
-      return kWrongUsage;
-    case doctor::Usage::kRun:
-      break;
-  }
   try {
+    if (!doctor::ParseOptions(argc, argv, options)) return 0;
+    if (options.explain) return doctor::RunExplain(*options.explain, options.json);
     return Examine(options);
+  } catch (const doctor::UsageError& e) {
+    return GiveUp(options, e.what(), kWrongUsage);
   } catch (const std::exception& e) {
-    std::cerr << "ssoclient-doctor: " << e.what() << '\n';
-    return kWrongUsage;
+    return GiveUp(options, e.what(), kNotChecked);
   }
 }

@@ -1,30 +1,31 @@
 // The conversion of a user name, through the library and the device's platform behind it.
 #include "doctor/checkup.h"
 #include "doctor/claims.h"
+#include "doctor/redact.h"
 #include "doctor/text.h"
 
 namespace doctor {
 
 namespace {
 
-void AddRefused(Checkup& checkup, const Reply& reply) {
-  const std::string& name = checkup.options.name;
-  Finding finding{
-      "name-form",    Severity::kFailure,
-      Clip(name, 80), "is not an account, \"@\" and a DNS domain",
-      reply.said,     "Let the provider put account@dns.domain into \"unique_name\" or \"email\"."};
+void AddRefused(Checkup& checkup, const Reply& reply, const std::string& shown) {
+  Finding finding{"name-form",
+                  Grade::kFailure,
+                  "The name " + shown + " is not an account, \"@\" and a DNS domain",
+                  {},
+                  "Set \"unique_name\" or \"email\" to account@dns.domain at the provider.",
+                  reply.said};
   if (!reply.ended) {
     finding.id = "name-silent";
-    finding.seen = "the device's directory service gave no answer within " +
-                   std::to_string(checkup.options.timeout) + " s";
-    finding.library = {Said::Does("waits for it")};
-    finding.remedy = "Look at the device's directory service.";
+    finding.cause = "The device's directory service did not answer within " +
+                    std::to_string(checkup.options.timeout) + " s";
+    finding.detail = {Said::Does("waits for it")};
+    finding.action = "Check the device's directory service: wbinfo --ping-dc";
   } else if (reply.Threw("QOVAWinsUserNameFqdn2Netbios failed.")) {
     finding.id = "name-refused";
-    finding.seen = "the device's directory service does not convert it";
-    finding.remedy =
-        "Join the device to the domain of this user, and see that its directory "
-        "service runs.";
+    finding.cause = "The device's directory service does not know the domain of " + shown;
+    finding.action =
+        "Join the device to the domain of this user, and start its directory service: wbinfo -t";
   }
   checkup.report.Add(finding);
 }
@@ -43,30 +44,27 @@ bool IsUnchanged(const std::string& principal, const std::string& user) {
 void CheckName(Checkup& checkup) {
   const std::string& name = checkup.options.name;
   if (name.empty()) return;
-  checkup.report.Begin("User name");
+  const std::string shown = Quote(Shown(name, 80));
   if (checkup.provider != Provider::kAzure) {
-    checkup.report.Note("name", Clip(name, 80),
-                        "names are converted by the profile \"azure\" alone; \"websphere\" takes "
-                        "\"sub\" as it is");
-    return;
+    return checkup.report.Good("name",
+                               "The profile \"websphere\" does not convert names; the "
+                               "user is \"sub\"");
   }
   Json::Value claims(Json::objectValue);
   claims["unique_name"] = name;
   const Reply reply = checkup.library.UserName(MakeToken(GoodHeader(checkup), claims));
-  if (!reply.result.isString()) return AddRefused(checkup, reply);
+  if (!reply.result.isString()) return AddRefused(checkup, reply, shown);
   const std::string user = reply.result.asString();
-  if (IsUnchanged(name, user)) {
-    checkup.report.Add(
-        {"name-unchanged",
-         Severity::kWarning,
-         Clip(name, 80),
-         "becomes " + Quote(Clip(user, 80)) + ", with the DNS domain as it was",
-         {Said::Does("signs the user in under this name")},
-         "Build the library with SSOCLIENT_PLATFORM=winbind or the device's own platform "
-         "library, unless users are known by this form."});
-    return;
-  }
-  checkup.report.Ok("name", Clip(name, 80), "becomes " + Quote(Clip(user, 80)));
+  const std::string becomes = "The name " + shown + " becomes " + Quote(Shown(user, 80));
+  if (!IsUnchanged(name, user)) return checkup.report.Good("name", becomes);
+  checkup.report.Add(
+      {"name-unchanged",
+       Grade::kWarning,
+       becomes + ", with the DNS domain unchanged",
+       {},
+       "Build the library with SSOCLIENT_PLATFORM=winbind or the device's own platform library, "
+       "unless users have names of this form.",
+       {Said::Does("signs the user in under this name")}});
 }
 
 }  // namespace doctor

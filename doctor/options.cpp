@@ -1,8 +1,12 @@
 #include "doctor/options.h"
 
 #include <getopt.h>
+#include <grp.h>
+#include <pwd.h>
+#include <unistd.h>
 
 #include <cstdlib>
+#include <cstring>
 #include <iostream>
 
 namespace doctor {
@@ -13,36 +17,34 @@ constexpr int kLongestTimeout = 300;
 
 constexpr char kHelp[] =
     R"(Usage: ssoclient-doctor [OPTION]...
-Tells what the single sign-on of this device will do, and why a login would fail.
+Finds out why users cannot sign in to this device, and what to do about it. Run it as root.
 
-  --user NAME      the user that the login program runs as; looks with its rights too
-  --program FILE   the login program; looks whether it can read the settings
-  --name USER      converts the user name USER (account@dns.domain), as a login would
-  --token          reads an ID token from standard input and tells what each check says
-  --try-secret     sends the client secret, with a false code, to the token endpoint
-  --offline        sends nothing at all
-  --timeout N      gives each request N seconds (1 to 300; 10)
-  --json           writes the findings as JSON
-  --help           prints this help
-  --version        prints the version
+  --user NAME        the user that the login program runs as; checks with its permissions too
+  --program FILE     the login program; checks that it can read the settings
+  --name USER        converts the user name USER (account@dns.domain) as a sign-in does
+  --token            reads an ID token from standard input and reports what each check says
+  --try-secret       sends the client secret, with a false code, to the token endpoint
+  --offline          sends nothing
+  --timeout SECONDS  the time for each request, 1 to 300 (default: 10)
+  --explain TEXT     explains the codes and messages in a pasted text ("-": standard input)
+  --verbose          shows all findings, their identifiers, and what the library logs and throws
+  --json             writes the findings as JSON
+  -h, --help         prints this help
+  --version          prints the version
 
 Without --try-secret no credentials leave the device. No secret, code or token is printed.
 
-Exit status: 0 if nothing was found that makes a login fail, 1 if a login would fail, 2 for a
-wrong command line or if something could not be checked and nothing else makes a login fail.
+Exit status: 0 if no failure was found, 1 if a failure was found, 2 for a wrong command line, 3 if
+something could not be checked and no failure was found.
 )";
 
-bool ParseTimeout(const char* text, int& seconds) {
+int ParseTimeout(const char* text) {
   char* end = nullptr;
   const long value = std::strtol(text, &end, 10);
-  if (end == text || *end != '\0' || value < 1 || value > kLongestTimeout) return false;
-  seconds = static_cast<int>(value);
-  return true;
-}
-
-Usage Wrong(const std::string& what) {
-  std::cerr << "ssoclient-doctor: " << what << " (--help tells the options)\n";
-  return Usage::kWrong;
+  if (end == text || *end != '\0' || value < 1 || value > kLongestTimeout) {
+    throw UsageError("--timeout requires a number of seconds from 1 to 300");
+  }
+  return static_cast<int>(value);
 }
 
 constexpr struct option kOptions[] = {{"user", required_argument, nullptr, 'u'},
@@ -52,15 +54,38 @@ constexpr struct option kOptions[] = {{"user", required_argument, nullptr, 'u'},
                                       {"try-secret", no_argument, nullptr, 's'},
                                       {"offline", no_argument, nullptr, 'o'},
                                       {"timeout", required_argument, nullptr, 'T'},
+                                      {"explain", required_argument, nullptr, 'e'},
+                                      {"verbose", no_argument, nullptr, 'V'},
                                       {"json", no_argument, nullptr, 'j'},
                                       {"help", no_argument, nullptr, 'h'},
                                       {"version", no_argument, nullptr, 'v'},
                                       {nullptr, 0, nullptr, 0}};
 
+// Errors in the command line are written as JSON too, wherever --json is.
+bool WantsJson(int argc, char** argv) {
+  for (int i = 1; i < argc; ++i) {
+    if (std::strcmp(argv[i], "--json") == 0) return true;
+  }
+  return false;
+}
+
+void CheckCombination(const Options& options) {
+  if (options.offline && options.try_secret) {
+    throw UsageError("--offline and --try-secret exclude each other");
+  }
+  const bool other = !options.user.empty() || !options.program.empty();
+  if (other && geteuid() != 0) throw UsageError("--user and --program need root");
+  if (!options.user.empty() && getpwnam(options.user.c_str()) == nullptr) {
+    throw UsageError("there is no user '" + options.user + "'");
+  }
+}
+
 }  // namespace
 
-Usage ParseOptions(int argc, char** argv, Options& options) {
-  for (int option; (option = getopt_long(argc, argv, "", kOptions, nullptr)) != -1;) {
+bool ParseOptions(int argc, char** argv, Options& options) {
+  options.json = WantsJson(argc, argv);
+  opterr = 0;
+  for (int option; (option = getopt_long(argc, argv, "h", kOptions, nullptr)) != -1;) {
     switch (option) {
       case 'u':
         options.user = optarg;
@@ -80,27 +105,31 @@ Usage ParseOptions(int argc, char** argv, Options& options) {
       case 'o':
         options.offline = true;
         break;
-      case 'j':
-        options.json = true;
-        break;
       case 'T':
-        if (!ParseTimeout(optarg, options.timeout))
-          return Wrong("--timeout wants 1 to 300 seconds");
+        options.timeout = ParseTimeout(optarg);
+        break;
+      case 'e':
+        options.explain = optarg;
+        break;
+      case 'V':
+        options.verbose = true;
+        break;
+      case 'j':
         break;
       case 'h':
         std::cout << kHelp;
-        return Usage::kDone;
+        return false;
       case 'v':
         std::cout << "ssoclient-doctor " << SSOCLIENT_VERSION << '\n';
-        return Usage::kDone;
+        return false;
       default:
-        return Usage::kWrong;  // getopt_long has said what
+        throw UsageError("unknown option, or an argument is missing or too many: '" +
+                         std::string(argv[optind - 1]) + "'");
     }
   }
-  if (optind < argc) return Wrong("unexpected argument '" + std::string(argv[optind]) + "'");
-  if (options.offline && options.try_secret)
-    return Wrong("--offline and --try-secret exclude each other");
-  return Usage::kRun;
+  if (optind < argc) throw UsageError("unexpected argument '" + std::string(argv[optind]) + "'");
+  CheckCombination(options);
+  return true;
 }
 
 }  // namespace doctor

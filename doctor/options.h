@@ -1,12 +1,15 @@
 // The command line.
 #pragma once
 
+#include <optional>
+#include <stdexcept>
 #include <string>
 
 namespace doctor {
 
 struct Options {
   bool json = false;
+  bool verbose = false;
   bool offline = false;     // no request leaves the device
   bool token = false;       // a token comes on standard input
   bool try_secret = false;  // send the client secret to the token endpoint
@@ -14,11 +17,18 @@ struct Options {
   std::string user;         // the login program's user
   std::string program;      // the login program's file
   std::string name;         // a principal name to convert
+  // A pasted text; nothing but its explanation is wanted then.
+  std::optional<std::string> explain;
 };
 
-enum class Usage { kRun, kDone, kWrong };
+// What is wrong with the command line, for one line.
+class UsageError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
 
-// Reads the command line. Prints help and version (kDone), or what is wrong with it (kWrong).
-Usage ParseOptions(int argc, char** argv, Options& options);
+// Reads the command line. Prints help or version and returns false if that is all that is wanted.
+// Throws UsageError; `options.json` is right by then.
+bool ParseOptions(int argc, char** argv, Options& options);
 
 }  // namespace doctor

@@ -1,80 +1,75 @@
-// What the doctor has found, and how it is told to people and to machines.
+// What the doctor has found. One cause is one finding.
 #pragma once
-
-#include <json/value.h>
 
 #include <string>
 #include <vector>
 
+#include "doctor/finding.h"
+
 namespace doctor {
 
-// Said is one thing that the library says or does about a finding.
-struct Said {
-  enum class Kind { kLogs, kThrows, kDoes };
-
-  Kind kind;
-  std::string source;  // kLogs: the unit, "sso.cpp"; kThrows: the class; kDoes: nothing
-  std::string text;    // the exact text (of a log line: behind "unit:line "); kDoes: our own words
-
-  static Said Does(const std::string& text) { return {Kind::kDoes, "", text}; }
+// Entry is a finding as it is reported: the same cause may be in several places.
+struct Entry {
+  std::string topic;
+  Finding finding;
+  std::vector<Place> places;
 };
 
-enum class Severity {
-  kOk,         // looked at and found right
-  kNote,       // worth knowing, nothing to do
-  kWarning,    // a login works, but something is unsafe or fragile
-  kUnchecked,  // could not be looked at
-  kFailure,    // a login would fail
-};
-
-struct Finding {
-  std::string id;  // stable; what a machine goes by
-  Severity severity;
-  std::string subject;  // the file, the endpoint, the claim
-  std::string seen;
-  std::vector<Said> library = {};
-  std::string remedy = "";
-};
-
-// Report collects findings by topic. Whatever it prints is free of the secrets that it was told.
+// Report collects findings by topic, and takes what they quote and name through redact.h.
 class Report {
  public:
   // Starts a topic; the findings that follow belong to it.
   void Begin(const std::string& topic);
-  void Add(const Finding& finding);
 
-  // Shorthands for what needs neither library text nor remedy.
-  void Ok(const std::string& id, const std::string& subject, const std::string& seen);
-  void Note(const std::string& id, const std::string& subject, const std::string& seen);
+  // Adds a finding. One that was there before, with the same cause and action, gets its place. A
+  // finding whose `because` is not in the report counts like any other.
+  void Add(Finding finding);
 
-  // Replaces a text by "(hidden)" in all that is printed. Ignores texts of less than 4 bytes,
-  // which would make the report unreadable.
-  void Hide(const std::string& secret);
+  // Shorthands, with the members in their order.
+  void Fail(const std::string& id, const std::string& cause, const Place& place,
+            const std::string& action, const std::vector<Said>& detail = {}) {
+    Add({id, Grade::kFailure, cause, place, action, detail});
+  }
+  void Warn(const std::string& id, const std::string& cause, const Place& place,
+            const std::string& action, const std::vector<Said>& detail = {}) {
+    Add({id, Grade::kWarning, cause, place, action, detail});
+  }
+  void Unchecked(const std::string& id, const std::string& cause, const Place& place,
+                 const std::string& action, const std::vector<Said>& detail = {}) {
+    Add({id, Grade::kUnchecked, cause, place, action, detail});
+  }
+  void Good(const std::string& id, const std::string& cause, const Place& place = {});
 
-  bool Failed() const { return Count(Severity::kFailure) > 0; }
+  // Adds that `what` could not be checked, as a consequence of the failure `because`.
+  void Skip(const std::string& what, const std::string& because);
 
-  // 0: nothing found that makes a login fail; 1: a login would fail; 2: something could not be
-  // checked, and nothing else makes a login fail.
+  void AddRequest(Request request);
+
+  bool Has(const std::string& id) const;
+  // What keeps later checks from their work in the topic that was begun last: its first failure
+  // or thing that could not be checked; empty if there is none.
+  std::string Obstacle() const;
+
+  // 0: no failure and everything checked; 1: a failure; 3: something could not be checked.
   int ExitStatus() const;
-
-  void PrintText() const;
-  void PrintJson() const;
-
- private:
-  struct Entry {
-    std::string topic;
-    Finding finding;
-  };
-
-  size_t Count(Severity severity) const;
-  std::string Clean(std::string text) const;
-  void PrintFinding(const Finding& finding) const;
-  Json::Value AsJson(const Entry& entry) const;
+  // What is the case, in a sentence without a full stop.
   std::string Verdict() const;
 
+  size_t Count(Grade grade) const;  // without consequences
+  // By grade, within a grade in the order of the checks.
+  std::vector<Entry> Sorted() const;
+  const std::vector<Request>& Requests() const { return requests; }
+
+ private:
   std::string topic;
   std::vector<Entry> entries;
-  std::vector<std::string> secrets;
+  std::vector<Request> requests;
 };
+
+// print.cpp
+void PrintText(const Report& report, bool verbose);
+void PrintJson(const Report& report);
+// What ended the doctor itself, in JSON.
+void PrintJsonError(const std::string& error, int exit_status);
 
 }  // namespace doctor

@@ -1,8 +1,7 @@
 // The values of the chosen provider's settings: URLs, identifiers, client secret.
-#include <curl/curl.h>
-
 #include "doctor/checkup.h"
 #include "doctor/claims.h"
+#include "doctor/redact.h"
 #include "doctor/text.h"
 #include "doctor/url.h"
 
@@ -14,100 +13,99 @@ namespace {
 constexpr size_t kShortestKey = 32;
 
 struct Endpoint {
-  const char* key;  // behind the provider's prefix
+  const char* key;  // without the provider's prefix
   const std::string& url;
   enum { kToken, kWellknown, kAuthorization, kLogout, kRedirect } role;
 };
 
-// What the library makes of a URL that it cannot use. It may yet try.
-std::vector<Said> WithBadUrl(const Checkup& checkup, const Endpoint& endpoint) {
-  if (checkup.options.offline) return {};
-  switch (endpoint.role) {
-    case Endpoint::kToken:
-      return checkup.library.TokenRequest("").said;
-    case Endpoint::kWellknown:
-      if (checkup.provider != Provider::kAzure) return {Said::Does("does not use it")};
-      return checkup.library.Verify(MakeToken(GoodHeader(checkup), GoodClaims(checkup))).said;
-    case Endpoint::kAuthorization:
-    case Endpoint::kLogout:
-      return {Said::Does("sends the browser there as it stands")};
-    case Endpoint::kRedirect:
-      break;
-  }
-  return {Said::Does("sends it to the provider as it stands, which refuses it")};
-}
-
 class EndpointCheck {
  public:
   EndpointCheck(Checkup& checked, const Endpoint& one)
-      : checkup(checked),
-        endpoint(one),
-        url(one.url),
-        name((checked.provider == Provider::kAzure ? "azure_" : "websphere_") +
-             std::string(one.key)) {}
+      : checkup(checked), endpoint(one), url(one.url), name(Quote(checked.Key(one.key))) {}
 
   void Run() {
     if (endpoint.url.empty()) return;  // a finding about the file
+    Hide(url.password());
     if (HasSpaceAround(endpoint.url)) {
       return Fail("url-space", "has a blank at its beginning or end", "Remove the blank.");
     }
-    if (!url.valid()) return Fail("url-malformed", "is no URL", "Write a whole URL, https://...");
+    if (!url.valid()) {
+      return Fail("url-malformed", "is not a URL", "Write a whole URL, https://...");
+    }
     if (endpoint.url.find("://") == std::string::npos) {
-      return Add("url-no-scheme", Grave(), "has no scheme",
-                 {Said::Does("takes it for plain http://, or hands it on as it stands")},
-                 "Put https:// before it.");
+      return Add("url-no-scheme", Grave(), "has no scheme", "Put https:// before it.",
+                 {Said::Does("treats it as plain http://, or passes it on unchanged")});
     }
     if (url.scheme() != "https" && url.scheme() != "http") {
-      return Fail("url-scheme", "has the scheme " + Quote(url.scheme()), "Use https://.");
+      return Fail("url-scheme", "has the scheme " + Quote(Shown(url.scheme(), 40)),
+                  "Use https://.");
     }
     CheckParts();
   }
 
  private:
-  // The WebSphere client has no use for the discovery document, and nobody signs in by logging
-  // out.
-  Severity Grave() const {
-    const bool unused =
-        endpoint.role == Endpoint::kLogout ||
-        (endpoint.role == Endpoint::kWellknown && checkup.provider == Provider::kWebSphere);
-    return unused ? Severity::kWarning : Severity::kFailure;
+  // The WebSphere client does not use the discovery document, and a sign-in no logout.
+  Grade Grave() const {
+    const bool unused = endpoint.role == Endpoint::kLogout ||
+                        (endpoint.role == Endpoint::kWellknown && !checkup.azure());
+    return unused ? Grade::kWarning : Grade::kFailure;
   }
 
-  void Add(const char* id, Severity severity, const std::string& seen,
-           const std::vector<Said>& said, const std::string& remedy) {
-    checkup.report.Add({id, severity, name, Clip(endpoint.url, 200) + " " + seen, said, remedy});
+  void Add(const char* id, Grade grade, const std::string& cause, const std::string& action,
+           const std::vector<Said>& said) {
+    Place place = checkup.At(endpoint.key);
+    place.url = Shown(endpoint.url, 200);
+    checkup.report.Add({id, grade, name + " " + cause, place, action, said});
   }
 
-  void Fail(const char* id, const std::string& seen, const std::string& remedy) {
+  void Fail(const char* id, const std::string& cause, const std::string& action) {
     checkup.bad_urls.insert(endpoint.url);
-    Add(id, Grave(), seen, WithBadUrl(checkup, endpoint), remedy);
+    Add(id, Grave(), cause, action, WithBadUrl());
+  }
+
+  // What the library does with a URL that it cannot use.
+  std::vector<Said> WithBadUrl() const {
+    if (checkup.options.offline) return {};
+    switch (endpoint.role) {
+      case Endpoint::kToken:
+        return checkup.library.TokenRequest("").said;
+      case Endpoint::kWellknown:
+        if (!checkup.azure()) return {Said::Does("does not use it")};
+        return checkup.library.Verify(MakeToken(GoodHeader(checkup), GoodClaims(checkup))).said;
+      case Endpoint::kAuthorization:
+      case Endpoint::kLogout:
+        return {Said::Does("sends the browser there")};
+      case Endpoint::kRedirect:
+        break;
+    }
+    return {Said::Does("sends it unchanged to the provider, which refuses it")};
   }
 
   void CheckParts() {
     if (!url.password().empty()) {
-      checkup.report.Hide(url.password());
-      Add("url-password", Severity::kWarning, "holds a password",
-          {Said::Does("uses the URL as it stands")}, "Take user name and password out of it.");
+      Add("url-password", Grade::kWarning, "holds a password",
+          "Remove user name and password from it.", {Said::Does("uses the URL unchanged")});
     }
     if (url.scheme() == "http") {
-      Add("url-not-https", Severity::kWarning, "is not encrypted",
-          {Said::Does("uses it all the same: code, secret and token can be read on the way")},
-          "Use https://.");
+      Add("url-not-https", Grade::kWarning,
+          "is not encrypted: code, secret and token can be read on the way", "Use https://.",
+          {Said::Does("uses it anyway")});
     }
     if (endpoint.role == Endpoint::kAuthorization && url.has_query()) {
-      Add("authorization-query", Severity::kFailure, "holds a query",
-          {Said::Does("puts a second \"?\" behind it, so that the provider misses the client ID")},
-          "Use an authorization endpoint without \"?\".");
+      Add("authorization-query", Grade::kFailure,
+          "holds a query, so the provider gets no client ID",
+          "Use an authorization endpoint without \"?\".",
+          {Said::Does("puts a second \"?\" behind it")});
     }
     if (endpoint.role == Endpoint::kLogout && url.has_query()) {
-      Add("logout-query", Severity::kWarning, "holds a query",
-          {Said::Does("puts a second \"?\" behind it, so that nobody comes back after logout")},
-          "Use an end-session endpoint without \"?\".");
+      Add("logout-query", Grade::kWarning,
+          "holds a query, so the browser does not return after logout",
+          "Use an end-session endpoint without \"?\".",
+          {Said::Does("puts a second \"?\" behind it")});
     }
     if (endpoint.role == Endpoint::kRedirect && url.has_fragment()) {
-      Add("redirect-fragment", Severity::kFailure, "holds a fragment",
-          WithBadUrl(checkup, endpoint),
-          "Remove \"#\" and what follows (RFC 6749, section 3.1.2).");
+      Add("redirect-fragment", Grade::kFailure, "holds a fragment (\"#\"), which providers refuse",
+          "Remove \"#\" and what follows (RFC 6749, section 3.1.2).", WithBadUrl());
     }
   }
 
@@ -117,37 +115,39 @@ class EndpointCheck {
   const std::string name;
 };
 
-void Warn(Checkup& checkup, const char* id, const std::string& key, const std::string& seen,
-          const std::vector<Said>& said, const std::string& remedy) {
-  checkup.report.Add({id, Severity::kWarning, key, seen, said, remedy});
+void Warn(Checkup& checkup, const char* id, const std::string& key, const std::string& cause,
+          const std::string& action, const std::vector<Said>& said) {
+  checkup.report.Add(
+      {id, Grade::kWarning, Quote(checkup.Key(key)) + " " + cause, checkup.At(key), action, said});
+}
+
+// The check of a token whose claim is that of another.
+std::vector<Said> WithOther(const Checkup& checkup, const char* claim) {
+  Json::Value claims = GoodClaims(checkup);
+  claims[claim] = "another";
+  return checkup.library.VerifyOffline(MakeToken(GoodHeader(checkup), claims)).said;
 }
 
 void CheckAzureValues(Checkup& checkup) {
   const std::string& tenant = checkup.tenant;
-  Json::Value claims = GoodClaims(checkup);
-  claims["tid"] = "another";
+  const std::string& client = checkup.settings.client_id;
+  const std::string lower = "Write it in lower case, as tokens do: it is compared byte by byte.";
   if (!tenant.empty() && !IsGuid(tenant)) {
-    Warn(checkup, "tenant-no-guid", "azure_tenant_id",
-         Quote(tenant) + " is not a tenant ID as Azure writes it into tokens",
-         checkup.library.VerifyOffline(MakeToken(GoodHeader(checkup), claims)).said,
-         "Set it to the directory (tenant) ID, not to a domain name.");
+    Warn(checkup, "tenant-no-guid", "tenant_id",
+         "is " + Quote(Shown(tenant, 80)) + ", not a tenant ID as Azure writes it into tokens",
+         "Set it to the directory (tenant) ID, not to a domain name.", WithOther(checkup, "tid"));
   } else if (HasUpperCase(tenant)) {
-    Warn(checkup, "id-upper-case", "azure_tenant_id", Quote(tenant) + " holds capital letters",
-         checkup.library.VerifyOffline(MakeToken(GoodHeader(checkup), claims)).said,
-         "Write it in small letters, as tokens do: it is compared byte by byte.");
+    Warn(checkup, "id-upper-case", "tenant_id", "has upper-case letters: " + tenant, lower,
+         WithOther(checkup, "tid"));
   }
-  if (IsGuid(checkup.settings.client_id) && HasUpperCase(checkup.settings.client_id)) {
-    claims = GoodClaims(checkup);
-    claims["aud"] = "another";
-    Warn(checkup, "id-upper-case", "azure_client_id",
-         Quote(checkup.settings.client_id) + " holds capital letters",
-         checkup.library.VerifyOffline(MakeToken(GoodHeader(checkup), claims)).said,
-         "Write it in small letters, as tokens do: it is compared byte by byte.");
+  if (IsGuid(client) && HasUpperCase(client)) {
+    Warn(checkup, "id-upper-case", "client_id", "has upper-case letters: " + Shown(client, 40),
+         lower, WithOther(checkup, "aud"));
   }
   if (IsGuid(checkup.settings.client_secret)) {
-    Warn(checkup, "secret-is-id", "azure_client_secret", "looks like the ID of a secret",
-         {Said::Does("sends it as it is; the provider refuses it")},
-         "Set it to the secret's value, which is shown once, when the secret is made.");
+    Warn(checkup, "secret-is-id", "client_secret", "looks like an ID, not like a secret",
+         "Set it to the secret's value, which is shown once, when the secret is made.",
+         {Said::Does("sends it unchanged; the provider refuses it")});
   }
 }
 
@@ -155,19 +155,19 @@ void CheckWebSphereSecret(Checkup& checkup) {
   const std::string& secret = checkup.settings.client_secret;
   const Reply reply =
       checkup.library.Verify(MakeSignedToken(GoodHeader(checkup), GoodClaims(checkup), secret));
-  const std::string length = std::to_string(secret.size()) + " bytes long";
+  const std::string length = "is " + std::to_string(secret.size()) + " bytes long";
   if (!reply.Thrown().empty()) {
-    checkup.report.Add({"secret-too-long", Severity::kFailure, "websphere_client_secret",
-                        "is " + length + "; 765 fit", reply.said,
-                        "Take a shorter client secret, 32 to 765 bytes."});
+    checkup.report.Fail(
+        "secret-too-long", "\"websphere_client_secret\" " + length + "; at most 765 can be used",
+        checkup.At("client_secret"), "Set a client secret of 32 to 765 bytes.", reply.said);
   } else if (secret.size() < kShortestKey) {
-    Warn(checkup, "secret-short", "websphere_client_secret",
-         "is " + length + ", too short a key for HS256 (RFC 7518, section 3.2)",
-         {Said::Does("takes any length: who guesses the secret can sign tokens")},
-         "Take a random client secret of 32 bytes or more (HS384: 48, HS512: 64).");
+    Warn(checkup, "secret-short", "client_secret",
+         length + ": anyone who guesses it can sign tokens (RFC 7518, section 3.2)",
+         "Set a random client secret of 32 bytes or more (HS384: 48, HS512: 64).",
+         {Said::Does("accepts any length")});
   } else {
-    checkup.report.Ok("secret", "websphere_client_secret",
-                      "a token signed under it passes the library's checks");
+    checkup.report.Good("secret", "A token that is signed with the client secret passes the checks",
+                        checkup.At("client_secret"));
   }
 }
 
@@ -175,7 +175,6 @@ void CheckWebSphereSecret(Checkup& checkup) {
 
 void CheckSettings(Checkup& checkup) {
   if (!checkup.settings_read) return;
-  checkup.report.Begin("Settings");
   const Settings& settings = checkup.settings;
   for (const Endpoint& endpoint :
        {Endpoint{"authorization_endpoint", settings.authorization_endpoint,
@@ -187,13 +186,11 @@ void CheckSettings(Checkup& checkup) {
     EndpointCheck(checkup, endpoint).Run();
   }
   if (HasSpaceAround(settings.client_secret)) {
-    Warn(checkup, "secret-space", "client secret", "has a blank or line end around it",
-         {Said::Does("sends it with them")}, "Remove them, unless the provider's has them.");
+    Warn(checkup, "secret-space", "client_secret", "has a blank or line break at an end",
+         "Remove it, unless the provider's secret has it.", {Said::Does("sends it unchanged")});
   }
-  if (checkup.provider == Provider::kAzure) CheckAzureValues(checkup);
-  if (checkup.provider == Provider::kWebSphere && !settings.client_secret.empty()) {
-    CheckWebSphereSecret(checkup);
-  }
+  if (checkup.azure()) CheckAzureValues(checkup);
+  if (!checkup.azure() && !settings.client_secret.empty()) CheckWebSphereSecret(checkup);
 }
 
 }  // namespace doctor

@@ -63,7 +63,13 @@ std::string Printable(const std::string& text) {
 }
 
 std::string Clip(const std::string& text, size_t length) {
-  return text.size() <= length ? text : text.substr(0, length) + "...";
+  if (text.size() <= length) return text;
+  while (length > 0 && (static_cast<unsigned char>(text[length]) & 0xc0) == 0x80) --length;
+  return text.substr(0, length) + "...";
+}
+
+std::string Plural(size_t count, const std::string& word) {
+  return std::to_string(count) + " " + word + (count == 1 ? "" : "s");
 }
 
 std::string Time(time_t when) {
@@ -95,6 +101,12 @@ std::string Nearest(const std::string& word, const std::vector<std::string>& can
   return nearest;
 }
 
+int Base64Value(char c) {
+  const std::string alphabet = kAlphabet;
+  const size_t value = alphabet.find(c == '+' ? '-' : c == '/' ? '_' : c);
+  return value == std::string::npos ? -1 : static_cast<int>(value);
+}
+
 std::string EncodeBase64Url(const std::string& bytes) {
   std::string text;
   unsigned bits = 0;
@@ -108,14 +120,13 @@ std::string EncodeBase64Url(const std::string& bytes) {
 }
 
 std::string DecodeBase64Url(const std::string& text) {
-  const std::string alphabet = kAlphabet;
   std::string bytes;
   unsigned bits = 0;
   int count = 0;
   for (const char c : text) {
     if (c == '=') continue;
-    const size_t value = alphabet.find(c == '+' ? '-' : c == '/' ? '_' : c);
-    if (value == std::string::npos) return "";
+    const int value = Base64Value(c);
+    if (value < 0) return "";
     bits = bits << 6 | static_cast<unsigned>(value);
     count += 6;
     if (count < 8) continue;
@@ -133,6 +144,10 @@ bool IsGuid(const std::string& text) {
       return false;
   }
   return true;
+}
+
+bool EndsWith(const std::string& text, const std::string& end) {
+  return text.size() >= end.size() && text.compare(text.size() - end.size(), end.size(), end) == 0;
 }
 
 bool HasSpaceAround(const std::string& text) {

@@ -5,6 +5,8 @@
 #include <cstring>
 #include <ctime>
 
+#include "doctor/redact.h"
+#include "doctor/terminal.h"
 #include "doctor/text.h"
 #include "doctor/url.h"
 
@@ -14,44 +16,43 @@ namespace {
 
 constexpr time_t kSoon = 14 * 86400;
 
-std::string Names(const Certificate& certificate) {
-  std::string names;
-  for (const std::string& name : certificate.names) names += (names.empty() ? "" : ", ") + name;
-  return names.empty() ? "no DNS name" : names;
-}
-
 // "CN = login.example.net (for login.example.net), issued by CN = Some CA"
 std::string Describe(const Certificate& certificate) {
-  return certificate.subject + " (for " + Names(certificate) + "), issued by " + certificate.issuer;
+  std::string names;
+  for (const std::string& name : certificate.names) names += (names.empty() ? "" : ", ") + name;
+  return Shown(certificate.subject, 200) + " (for " +
+         (names.empty() ? "no DNS name" : Shown(names, 200)) + "), issued by " +
+         Shown(certificate.issuer, 200);
 }
 
 class TransferReport {
  public:
   TransferReport(Checkup& checked, const Destination& to, const WebAnswer& got)
-      : checkup(checked), destination(to), answer(got), host(ParsedUrl(to.url).host()) {}
+      : checkup(checked),
+        destination(to),
+        answer(got),
+        host(Shown(ParsedUrl(to.url).host(), 100)),
+        detail(Shown(got.detail, 200)) {}
 
   bool Run() {
-    if (answer.code == CURLE_OK) {
-      AddGood();
-      return true;
-    }
     switch (answer.code) {
+      case CURLE_OK:
+        AddGood();
+        return true;
       case CURLE_URL_MALFORMAT:
       case CURLE_UNSUPPORTED_PROTOCOL:
-        Fail("url-unusable", Clip(destination.url, 200) + ": " + answer.detail,
-             "Write a whole URL, https://...");
+        Fail("url-unusable", "The URL cannot be used: " + detail, "Write a whole URL, https://...");
         break;
       case CURLE_COULDNT_RESOLVE_HOST:
       case CURLE_COULDNT_RESOLVE_PROXY:
-        Fail("name-not-resolved", answer.detail,
-             "Look at the host name " + Quote(host) +
-                 " and at the device's name servers "
-                 "(/etc/resolv.conf): \"getent hosts " +
-                 host + "\" must give an address.");
+        Fail("name-not-resolved", "The host name cannot be resolved: " + detail,
+             "Correct the host name or the device's name servers (/etc/resolv.conf), until it has "
+             "an address: getent hosts " +
+                 host);
         break;
       case CURLE_COULDNT_CONNECT:
-        Fail("connect-failed", Reason(),
-             "Look at host and port in the URL, at routes, firewall and proxy of the device.");
+        Fail("connect-failed", "The server cannot be reached: " + detail + Reason(),
+             "Check host and port in the URL, then routes, firewall and proxy of the device.");
         break;
       case CURLE_OPERATION_TIMEDOUT:
         AddSilent();
@@ -60,77 +61,79 @@ class TransferReport {
         AddRefusedCertificate();
         break;
       case CURLE_SSL_CACERT_BADFILE:
-        Fail(
-            "tls-no-store", answer.detail,
-            "Install the certificate authorities (package ca-certificates): " + TrustStore() + ".");
+        Fail("tls-no-store", "This device has no certificate authorities: " + detail,
+             "Install them (package ca-certificates): " + TrustStore());
         break;
       case CURLE_SSL_CONNECT_ERROR:
-        if (answer.verify_error != X509_V_OK) return AddRefusedCertificate(), false;
-        Fail("tls-failed", answer.detail,
-             "Look whether the port speaks TLS, and TLS 1.2 or later.");
+        if (answer.verify_error != X509_V_OK) {
+          AddRefusedCertificate();
+          break;
+        }
+        Fail("tls-failed", "The TLS handshake fails: " + detail,
+             "Check that the port speaks TLS, and TLS 1.2 or later: openssl s_client -connect " +
+                 host + ":443");
         break;
       default:
-        Fail("transfer-failed", answer.detail,
-             "Look at the provider, and at what stands between it and the device (proxy, load "
-             "balancer).");
+        Fail("transfer-failed", "The connection breaks: " + detail,
+             "Check the provider, and the proxy or load balancer between it and the device.");
     }
     return false;
   }
 
  private:
-  void Fail(const char* id, const std::string& seen, const std::string& remedy) {
-    Add(id, destination.grave, seen, destination.library(), remedy);
+  void Fail(const char* id, const std::string& cause, const std::string& action) {
+    Add(id, destination.grave, cause, action, destination.library());
   }
 
-  void Add(const char* id, Severity severity, const std::string& seen,
-           const std::vector<Said>& said, const std::string& remedy) {
-    checkup.report.Add({id, severity, destination.subject, seen, said, remedy});
+  void Add(const char* id, Grade grade, const std::string& cause, const std::string& action,
+           const std::vector<Said>& said) {
+    checkup.report.Add({id, grade, cause, At(destination, answer), action, said});
   }
 
   std::string Reason() const {
-    const std::string reason = answer.os_error != 0 ? std::strerror(answer.os_error) : "";
-    return answer.detail + (reason.empty() ? "" : " (" + reason + ")");
+    return answer.os_error != 0 ? " (" + std::string(std::strerror(answer.os_error)) + ")" : "";
   }
 
   // The library is not asked: it would wait.
   void AddSilent() {
     const std::string within = " within " + std::to_string(checkup.options.timeout) + " s";
     const bool encrypted = ParsedUrl(destination.url).scheme() == "https";
-    std::string seen = "the server took the request and did not answer it in full" + within;
-    if (encrypted && !answer.encrypted)
-      seen = "the server did not finish the TLS handshake" + within;
-    if (!answer.connected) seen = "no connection to " + host + within;
-    Add("server-silent", destination.grave, seen,
-        {Said::Does("waits for as long as it takes: it sets no time-out")},
-        "Look at the provider and at the firewall; the login program must end a login that takes "
-        "too long (--timeout gives more time here).");
+    std::string cause = "The server took the request and did not answer it in full" + within;
+    if (encrypted && !answer.encrypted) {
+      cause = "The server did not finish the TLS handshake" + within;
+    }
+    if (answer.address.empty()) cause = "There is no connection to " + host + within;
+    Add("server-silent", destination.grave, cause,
+        "Check the firewall and the provider; --timeout gives more time.",
+        {Said::Does("sets no time-out: the login program must end a sign-in that takes too long")});
   }
 
   void AddRefusedCertificate() {
     const std::vector<Certificate>& chain = answer.certificates;
     if (answer.verify_error == X509_V_OK) {
       return Fail("tls-wrong-name",
-                  "the certificate is not for " + Quote(host) + ": " +
-                      (chain.empty() ? answer.detail : Describe(chain[0])),
-                  "Use a host name that the certificate stands for, or get the provider a "
-                  "certificate for " +
+                  "The certificate is not for " + Quote(host) + ": " +
+                      (chain.empty() ? detail : Describe(chain[0])),
+                  "Use a host name of the certificate, or get the provider a certificate for " +
                       Quote(host) + ".");
     }
     const Certificate* const about =
         answer.verify_depth < chain.size() ? &chain[answer.verify_depth] : nullptr;
     const std::string which = about != nullptr ? Describe(*about) : "a certificate";
     if (answer.verify_error == X509_V_ERR_CERT_HAS_EXPIRED && about != nullptr) {
-      return Fail("tls-expired", which + ": expired " + Time(about->not_after),
+      return Fail("tls-expired", "A certificate expired " + Time(about->not_after) + ": " + which,
                   "Renew the provider's certificate, if this device's clock is right (" +
                       Time(time(nullptr)) + ").");
     }
     if (answer.verify_error == X509_V_ERR_CERT_NOT_YET_VALID && about != nullptr) {
-      return Fail("tls-not-yet-valid", which + ": valid from " + Time(about->not_before),
+      return Fail("tls-not-yet-valid",
+                  "A certificate is valid only from " + Time(about->not_before) + ": " + which,
                   "Set this device's clock (" + Time(time(nullptr)) + "), or wait.");
     }
     const bool gap = answer.verify_error == X509_V_ERR_UNABLE_TO_GET_ISSUER_CERT_LOCALLY ||
                      answer.verify_error == X509_V_ERR_UNABLE_TO_VERIFY_LEAF_SIGNATURE;
-    Fail("tls-untrusted", which + ": " + answer.verify_text,
+    Fail("tls-untrusted",
+         "This device does not trust the certificate (" + answer.verify_text + "): " + which,
          "Add the certificate authority to " + TrustStore() +
              (gap ? ", or let the server send its intermediate certificates." : "."));
   }
@@ -139,32 +142,41 @@ class TransferReport {
     if (answer.date != 0) {
       checkup.server_times.push_back({host, answer.date, answer.received});
     }
+    const Place place = At(destination, answer);
     if (answer.certificates.empty()) {
-      checkup.report.Ok("connection", destination.subject, "answers");
-      return;
+      return checkup.report.Good("connection", "The " + destination.what + " answers", place);
     }
     const Certificate& own = answer.certificates[0];
-    const time_t left = own.not_after - time(nullptr);
-    if (left < kSoon) {
-      Add("tls-expires-soon", Severity::kWarning,
-          Describe(own) + ": expires " + Time(own.not_after), {Said::Does("trusts it until then")},
-          "Renew the provider's certificate in time.");
-      return;
+    if (own.not_after - time(nullptr) < kSoon) {
+      return Add("tls-expires-soon", Grade::kWarning,
+                 "The certificate expires " + Time(own.not_after) + ": " + Describe(own),
+                 "Renew the provider's certificate in time.", {Said::Does("trusts it until then")});
     }
-    checkup.report.Ok(
-        "connection", destination.subject,
-        "answers; certificate " + Describe(own) + ", valid until " + Time(own.not_after));
+    checkup.report.Good("connection",
+                        "The " + destination.what + " answers; certificate " + Describe(own) +
+                            ", valid until " + Time(own.not_after),
+                        place);
   }
 
   Checkup& checkup;
   const Destination& destination;
   const WebAnswer& answer;
   const std::string host;
+  const std::string detail;
 };
 
 }  // namespace
 
-bool ReportTransfer(Checkup& checkup, const Destination& destination, const WebAnswer& answer) {
+Place At(const Destination& destination, const WebAnswer& answer) {
+  return {"", "", Shown(destination.url, 200), answer.address};
+}
+
+bool Exchange(Checkup& checkup, const Destination& destination, const std::string* body,
+              WebAnswer& answer) {
+  Progress("Waiting for the " + destination.what + ", " + destination.url);
+  answer = Fetch(destination.url, body, checkup.options.timeout);
+  checkup.report.AddRequest({destination.what, body == nullptr ? "GET" : "POST", destination.url,
+                             answer.address, answer.status, answer.milliseconds});
   return TransferReport(checkup, destination, answer).Run();
 }
 

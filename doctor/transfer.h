@@ -12,14 +12,19 @@ namespace doctor {
 
 // What is asked, and what it means if no answer comes.
 struct Destination {
-  std::string subject;  // "token endpoint"
+  std::string what;  // "token endpoint"
   std::string url;
-  Severity grave;  // of a request that fails
+  Grade grave;  // of a request that fails
   // What the library says about the same request; asked only if it may end in good time.
   std::function<std::vector<Said>()> library;
 };
 
-// Adds what the request showed about the way to the server. True if an HTTP answer came.
-bool ReportTransfer(Checkup& checkup, const Destination& destination, const WebAnswer& answer);
+// The URL, and the IP address that answered.
+Place At(const Destination& destination, const WebAnswer& answer);
+
+// Sends the request (a form if `body` is given), and adds it and what it shows about the way to
+// the server to the report. True if an HTTP answer came.
+bool Exchange(Checkup& checkup, const Destination& destination, const std::string* body,
+              WebAnswer& answer);
 
 }  // namespace doctor

@@ -128,7 +128,10 @@ void Inspect(CURL* handle, WebAnswer& answer) {
   curl_easy_getinfo(handle, CURLINFO_OS_ERRNO, &os_error);
   answer.os_error = static_cast<int>(os_error);
   curl_easy_getinfo(handle, CURLINFO_RESPONSE_CODE, &answer.status);
-  answer.connected = !Text(handle, CURLINFO_PRIMARY_IP).empty();
+  answer.address = Text(handle, CURLINFO_PRIMARY_IP);
+  curl_off_t microseconds = 0;
+  curl_easy_getinfo(handle, CURLINFO_TOTAL_TIME_T, &microseconds);
+  answer.milliseconds = static_cast<long>(microseconds / 1000);
   answer.encrypted = Happened(handle, CURLINFO_APPCONNECT_TIME_T);
   answer.location = Text(handle, CURLINFO_REDIRECT_URL);
   answer.type = Text(handle, CURLINFO_CONTENT_TYPE);

@@ -1,4 +1,4 @@
-// One HTTP request of the doctor's own, which remembers what the library's does not tell.
+// One HTTP request of the doctor, which records what the library does not report.
 #pragma once
 
 #include <curl/curl.h>
@@ -12,16 +12,15 @@ namespace doctor {
 struct Certificate {
   std::string subject;
   std::string issuer;
-  std::vector<std::string> names;  // DNS names that it stands for
+  std::vector<std::string> names;  // its DNS names
   time_t not_before = 0;
   time_t not_after = 0;
 };
 
 struct WebAnswer {
   CURLcode code = CURLE_OK;
-  std::string detail;  // libcurl's own words on the failure
-  int os_error = 0;    // errno of a failed connection
-  bool connected = false;
+  std::string detail;      // libcurl's own words on the failure
+  int os_error = 0;        // errno of a failed connection
   bool encrypted = false;  // the TLS handshake was done
 
   // The server's certificates as it sent them, its own first, and what OpenSSL said of them:
@@ -31,6 +30,8 @@ struct WebAnswer {
   std::string verify_text;
   size_t verify_depth = 0;
 
+  std::string address;  // the IP address of the other end
+  long milliseconds = 0;
   long status = 0;       // HTTP
   std::string location;  // of a redirect
   std::string type;      // Content-Type
@@ -43,7 +44,7 @@ struct WebAnswer {
 // certificates are verified. Takes at most `seconds`; keeps at most 1 MB.
 WebAnswer Fetch(const std::string& url, const std::string* body, int seconds);
 
-// The bundle and the folder of certificate authorities that libcurl goes by.
+// The bundle and the folder of certificate authorities that libcurl uses.
 std::string TrustStore();
 
 }  // namespace doctor

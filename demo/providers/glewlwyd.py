@@ -12,12 +12,16 @@ import sqlite3
 import urllib.parse
 
 from browser import Browser, BrowserError
+from providers import BOTH
 from stage import run, write
 
 SCHEMA = "/usr/share/dbconfig-common/data/glewlwyd/install/sqlite3"
 WEBAPP = "/usr/share/glewlwyd/webapp"
 PAGE_SETTINGS = "/usr/share/glewlwyd/templates/config.json"
 USER = "glewlwyd"
+# Its end-session endpoint does nothing without an ID token. This page of its web interface ends
+# the session; the last parameter takes what the device appends.
+LOGOUT = "/login.html?prompt=single_logout&from=device"
 
 CONFIG = """
 port = {port}
@@ -65,7 +69,10 @@ REALM = {
 class Glewlwyd:
     title = "Glewlwyd"
     fields = "#username", "#password"  # of the login page
-    comes_back = False  # after a logout: it ends on an empty page of its own
+    comes_back = False  # after a logout
+    goodbye = "Session closed"
+    why_not_back = "it closes the session and does not redirect"
+    setups = BOTH
 
     def __init__(self, stage, person):
         self.url = f"https://{stage.provider_name}:{stage.provider_port}"
@@ -180,9 +187,13 @@ class Glewlwyd:
             "token_endpoint_auth_method": ["client_secret_post"], "scope": []})
         return {part: f"{self.url}/api/{name}/{path}" for part, path in (
             ("wellknown", ".well-known/openid-configuration"), ("authorization", "auth"),
-            ("token", "token"), ("logout", "end_session"))}
+            ("token", "token"))} | {"logout": self.url + LOGOUT}
 
     # -- a person in front of the login page -----------------------------------------------
+
+    @property
+    def login_name(self):
+        return self._person.account
 
     def sign_in(self, browser, page):
         """Does what the login page's script does with name and password; returns its answer."""
@@ -213,5 +224,7 @@ class Glewlwyd:
             tab.wait(lambda: not tab.all(".form-check-input"), "the grant")
         tab.click("button.btn-success")
 
-    def agree_to_leave(self, tab):
-        """Asks nothing at the logout."""
+    @staticmethod
+    def agree_to_leave(tab):
+        """Confirms the logout."""
+        tab.click("button.btn-danger")

@@ -12,6 +12,7 @@ import secrets
 import shutil
 import sqlite3
 
+from providers import BOTH
 from stage import WEB_USER, run, write
 
 SHARE = "/usr/share/lemonldap-ng/portal"
@@ -75,6 +76,7 @@ class LemonLDAP:
     title = "LemonLDAP::NG"
     fields = "input[name=user]", "input[name=password]"  # of the login page
     comes_back = True  # after a logout
+    setups = BOTH
 
     def __init__(self, stage, person):
         self.url = f"https://{stage.provider_name}:{stage.provider_port}"
@@ -183,6 +185,10 @@ class LemonLDAP:
                 name: client["claims"] for name, client in self._clients.items()}}
 
     # -- a person in front of the pages ----------------------------------------------------
+
+    @property
+    def login_name(self):
+        return self._person.account
 
     def agree(self, tab):
         """Asks nothing after name and password."""

@@ -5,37 +5,19 @@ the Azure client, HS256 under the client's secret for the WebSphere client. A sc
 one thing at a time, see Script. Everything that it was asked is kept in `seen`.
 """
 
-import base64
 import contextlib
 import dataclasses
-import hashlib
-import hmac
 import html
-import http.server
 import json
 import secrets
-import socket
-import ssl
-import subprocess
-import sys
 import threading
 import time
 import urllib.parse
 
 from browser import BrowserError
-from stage import run, write
-
-LOGIN_PAGE = """<!DOCTYPE html>
-<html lang="en"><head><meta charset="utf-8"><title>Provider</title></head><body><main>
-<h1>Sign in</h1><p>{hint}</p><form id="login" method="post" action="{action}">
-<label>Name <input id="username" name="username" autocomplete="username" autofocus></label>
-<label>Password <input id="password" name="password" type="password"
-autocomplete="current-password"></label>
-<button>Sign in</button></form></main></body></html>"""
-
-
-def _base64url(data):
-    return base64.urlsafe_b64encode(data).rstrip(b"=").decode()
+from providers import BOTH
+from providers.jose import RsaKey, base64url, hmac_signer, signing_input
+from providers.web import Answer, Handler, Site, login_page, with_query
 
 
 @dataclasses.dataclass
@@ -44,6 +26,7 @@ class Script:
     send instead."""
     refuse: dict = None        # parameters of an error answer to the authorization request
     claims: object = None      # changes the claims of the ID token
+    raw_claims: object = None  # changes their text, in bytes
     header: object = None      # changes the header of the ID token
     signature: object = None   # changes the bytes of the signature
     sign: object = None        # signs instead of the provider's key: bytes to signature
@@ -51,6 +34,7 @@ class Script:
     document: object = None    # changes (path, status, type, body) of "wellknown" and "keys"
     silent: tuple = ()         # paths ("token", "keys"...) that take the request and do not answer
     cut: tuple = ()            # paths whose answer ends in its middle
+    flood: dict = dataclasses.field(default_factory=dict)  # per path: writes to the connection
     leave: bool = False        # nobody listens any more once a code is handed out
 
 
@@ -63,21 +47,21 @@ class Realm:
     keys: list
 
 
-class Scripted:
+class Scripted(Site):
     title = "scripted provider"
     fields = "#username", "#password"  # of the login page
     comes_back = True  # after a logout
+    setups = BOTH
 
     def __init__(self, stage, person):
+        super().__init__()
         self.url = f"https://{stage.provider_name}:{stage.provider_port}"
         self.script = Script()
-        self.seen = []
         self.sent = []  # where the browsers were sent back to
         self._stage = stage
         self._person = person
         self._realms = {}
         self._codes = {}
-        self._servers = []
         self._keys = 0
         self._released = threading.Event()
 
@@ -87,26 +71,9 @@ class Scripted:
         self.listen(self._stage.provider_port,
                     self._stage.certificate(self._stage.provider_name))
 
-    def listen(self, port, certificate):
-        """Opens one more door to the same provider, with a certificate of its own."""
-        context = ssl.create_default_context(ssl.Purpose.CLIENT_AUTH)
-        context.load_cert_chain(*certificate)
-        handler = type("Handler", (_Handler,), {"provider": self})
-        server = _Server(("127.0.0.1", port), handler)
-        # The handshake belongs to the connection's own thread.
-        server.socket = context.wrap_socket(server.socket, server_side=True,
-                                            do_handshake_on_connect=False)
-        threading.Thread(target=server.serve_forever, args=(0.05,), daemon=True).start()
-        self._servers.append(server)
-
     def stop(self, but=None):
-        """Nobody listens any more, and connections are cut; `but` is one that is left."""
         self.release()
-        while self._servers:
-            server = self._servers.pop()
-            server.shutdown()
-            server.server_close()
-            server.hang_up(but)
+        super().stop(but)
 
     def release(self):
         """Lets the requests go that a silent token endpoint holds; they get no answer."""
@@ -124,16 +91,8 @@ class Scripted:
     def _key(self, identity):
         """A new RSA key: what signs with it, and its public half for the key set."""
         self._keys += 1
-        path = f"{self._stage.folder}/scripted-{self._keys}.key"
-        write(path, run("openssl", "genpkey", "-algorithm", "RSA"), 0o600)
-        modulus = run("openssl", "rsa", "-in", path, "-noout", "-modulus").split("=")[1].strip()
-
-        def sign(data):
-            return subprocess.run(["openssl", "dgst", "-sha256", "-sign", path], input=data,
-                                  stdout=subprocess.PIPE, check=True, timeout=30).stdout
-
-        return sign, {"kty": "RSA", "kid": identity, "n": _base64url(bytes.fromhex(modulus)),
-                      "e": "AQAB"}
+        key = RsaKey(f"{self._stage.folder}/scripted-{self._keys}")
+        return key.sign, key.public(identity)
 
     def signer(self, name):
         """What signs now; for a script to use later."""
@@ -147,10 +106,8 @@ class Scripted:
         realm.keys = [public]
 
     def add_websphere(self, client):
-        def sign(data):
-            return hmac.new(client.secret.encode(), data, hashlib.sha256).digest()
-        return self._add("websphere", Realm(
-            client, sign, {"alg": "HS256"}, {"sub": self._person.account}, []))
+        return self._add("websphere", Realm(client, hmac_signer(client.secret), {"alg": "HS256"},
+                                            {"sub": self._person.account}, []))
 
     def _add(self, name, realm):
         self._realms[name] = realm
@@ -158,6 +115,10 @@ class Scripted:
                 for part in ("wellknown", "authorization", "token", "logout")}
 
     # -- a person in front of the login page -----------------------------------------------
+
+    @property
+    def login_name(self):
+        return self._person.account
 
     def sign_in(self, browser, page):
         """Fills in the login form; returns the page that follows."""
@@ -173,28 +134,42 @@ class Scripted:
 
     # -- the endpoints ---------------------------------------------------------------------
 
+    def answer_at(self, name, path, request):
+        query, form = request.query, request.form
+        if name not in self._realms:
+            return Answer(404)
+        if path == "authorization":
+            return self.authorization(name, query, form)
+        if path == "token" and form is not None:
+            return _document(*self.token(name, form))
+        if path in ("wellknown", "keys"):
+            return _document(*self.document(name, path))
+        if path == "logout" and "post_logout_redirect_uri" in query:
+            return Answer(302, "", {"Location": query["post_logout_redirect_uri"]})
+        return Answer(200, "signed out")
+
     def authorization(self, name, query, form):
         client = self._realms[name].client
         if query.get("redirect_uri") != client.redirect_uri or \
                 query.get("client_id") != client.identity:
-            return 400, {}, "unknown client"
+            return Answer(400, "unknown client")
         if self.script.refuse is not None:
             return self._back(query, self.script.refuse)
         action = html.escape(f"/{name}/authorization?{urllib.parse.urlencode(query)}")
         if form is None:
-            return 200, {}, LOGIN_PAGE.format(action=action, hint="")
+            return login_page(action)
         if (form.get("username"), form.get("password")) != \
                 (self._person.account, self._person.password):
-            return 403, {}, LOGIN_PAGE.format(action=action, hint="Wrong name or password.")
+            refused = login_page(action, "Wrong name or password.")
+            return dataclasses.replace(refused, status=403)
         code = secrets.token_urlsafe(16)
         self._codes[code] = (name, query.get("nonce"))
         return self._back(query, {"code": code})
 
     def _back(self, query, values):
         values = {**values, "state": query.get("state", "")}
-        self.sent.append(query["redirect_uri"] + "?" +
-                         urllib.parse.urlencode(values, quote_via=urllib.parse.quote))
-        return 302, {"Location": self.sent[-1]}, ""
+        self.sent.append(with_query(query["redirect_uri"], values))
+        return Answer(302, "", {"Location": self.sent[-1]})
 
     def token(self, name, form):
         """The answer of the token endpoint: status, type, body."""
@@ -221,11 +196,14 @@ class Scripted:
             claims = self.script.claims(claims)
         if self.script.header is not None:
             header = self.script.header(header)
-        signed = ".".join(_base64url(json.dumps(part).encode()) for part in (header, claims))
+        signed = signing_input(header, claims)
+        if self.script.raw_claims is not None:
+            parts = [self.script.raw_claims(json.dumps(claims).encode())]
+            signed = signed.split(".")[0] + "." + base64url(parts[0])
         signature = (self.script.sign or realm.sign)(signed.encode())
         if self.script.signature is not None:
             signature = self.script.signature(signature)
-        return signed + "." + _base64url(signature)
+        return signed + "." + base64url(signature)
 
     def document(self, name, path):
         """The discovery document or the key set: status, type, body."""
@@ -237,9 +215,6 @@ class Scripted:
         change = self.script.document
         return answer if change is None else change(path, *answer)
 
-    def known(self, name):
-        return name in self._realms
-
     def last_code(self):
         """A code that nobody has used yet."""
         if not self._codes:
@@ -247,86 +222,30 @@ class Scripted:
         return next(reversed(self._codes))
 
 
-class _Server(http.server.ThreadingHTTPServer):
-    daemon_threads = True
-
-    def __init__(self, *arguments):
-        self._open = set()
-        super().__init__(*arguments)
-
-    def process_request(self, request, client_address):
-        self._open.add(request)
-        super().process_request(request, client_address)
-
-    def shutdown_request(self, request):
-        self._open.discard(request)
-        super().shutdown_request(request)
-
-    def hang_up(self, but):
-        """A browser connects before it knows what to ask: that connection would be served."""
-        for request in list(self._open):
-            if request is not but:
-                with contextlib.suppress(OSError):
-                    request.shutdown(socket.SHUT_RDWR)
-
-    def handle_error(self, request, client_address):
-        """Who does not like the certificate hangs up: no mistake of the provider."""
-        if not isinstance(sys.exc_info()[1], OSError):
-            super().handle_error(request, client_address)
+def _document(status, kind, body):
+    return Answer(status, body, {"Content-Type": kind})
 
 
-class _Handler(http.server.BaseHTTPRequestHandler):
-    provider = None
-    timeout = 30
-    _cut = False
+class _Handler(Handler):
+    """Takes the answers of a Scripted, and does to the connection what its script demands."""
 
-    def log_message(self, *_):
-        pass
-
-    def do_GET(self):  # noqa: N802 (the base class's name)
-        self._serve(None)
-
-    def do_POST(self):  # noqa: N802
-        size = int(self.headers.get("Content-Length", 0))
-        body = self.rfile.read(size).decode()
-        self._serve(dict(urllib.parse.parse_qsl(body, keep_blank_values=True)))
-
-    def _serve(self, form):
-        parts = urllib.parse.urlsplit(self.path)
-        query = dict(urllib.parse.parse_qsl(parts.query, keep_blank_values=True))
-        name, _, path = parts.path.lstrip("/").partition("/")
-        self.provider.seen.append((self.command, parts.path, query, form))
-        self._cut = path in self.provider.script.cut
-        if path in self.provider.script.silent:
-            self.provider.hold()
+    def handle_request(self, request):
+        provider = self.site
+        name, _, path = request.path.lstrip("/").partition("/")
+        provider.seen.append((request.method, request.path, request.query, request.form))
+        if path in provider.script.silent:
+            provider.hold()
             self.close_connection = True
-        elif not self.provider.known(name):
-            self._send(404, {}, "")
-        elif path == "authorization":
-            answer = self.provider.authorization(name, query, form)
-            if form is not None and self.provider.script.leave:
-                self.provider.stop(self.connection)
-            self._send(*answer)
-        elif path == "token" and form is not None:
-            self._send_document(*self.provider.token(name, form))
-        elif path in ("wellknown", "keys"):
-            self._send_document(*self.provider.document(name, path))
-        elif path == "logout" and "post_logout_redirect_uri" in query:
-            self._send(302, {"Location": query["post_logout_redirect_uri"]}, "")
-        else:
-            self._send(200, {}, "signed out")
-
-    def _send_document(self, status, kind, body):
-        self._send(status, {"Content-Type": kind}, body)
-
-    def _send(self, status, headers, body):
-        data = body.encode()
-        try:
-            self.send_response(status)
-            headers = {"Content-Type": "text/html; charset=utf-8", **headers}
-            for field, value in {**headers, "Content-Length": str(len(data))}.items():
-                self.send_header(field, value)
-            self.end_headers()
-            self.wfile.write(data[:len(data) // 2] if self._cut else data)
-        except OSError:  # whoever asked is gone
+            return
+        if path in provider.script.flood:
             self.close_connection = True
+            with contextlib.suppress(OSError):  # whoever asked has had enough
+                provider.script.flood[path](self.wfile)
+            return
+        answer = provider.answer_at(name, path, request)
+        if path == "authorization" and request.form is not None and provider.script.leave:
+            provider.stop(self.connection)
+        self.send(answer, cut=path in provider.script.cut)
+
+
+Scripted.handler = _Handler

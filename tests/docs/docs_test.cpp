@@ -163,6 +163,20 @@ TEST(Configuration, HoldsEveryKey) {
   EXPECT_EQ(count, 18u);
 }
 
+TEST(Configuration, HasExamplesOfEveryKeyInTheManualPage) {
+  const std::string page = contents(kRoot / "docs/man/ssoclient.5");
+  Texts keys;
+  for (const char* name : {"profile.conf", "azure.conf", "websphere.conf"}) {
+    const std::string example = contents(kRoot / "docs/examples" / name);
+    EXPECT_NE(page.find("\n" + example + ".Ed\n"), std::string::npos) << name;
+    keys.merge(matches(example, "\"([a-z_]+)\": "));
+  }
+  EXPECT_EQ(keys.size(), 18u);
+  for (const std::string& key : keys) {
+    EXPECT_NE(page.find(".It Cm " + key + " "), std::string::npos) << key;
+  }
+}
+
 // --- the doctor
 
 Texts documentedFindings() {
@@ -195,9 +209,9 @@ TEST(DoctorPage, HoldsNoFindingThatIsNotSeeded) {
 
 TEST(DoctorPage, HoldsTheOptionsOfTheHelp) {
   const std::string page = contents(kRoot / "docs/man/ssoclient-doctor.8");
-  const Texts helped = matches(contents(kRoot / "doctor/options.cpp"), "\n  --([a-z-]+)");
-  EXPECT_EQ(helped.size(), 10u);
-  EXPECT_EQ(matches(page, "\n\\.It Fl -([a-z-]+)"), helped);
+  const Texts helped = matches(contents(kRoot / "doctor/options.cpp"), "\n  (?:-h, )?--([a-z-]+)");
+  EXPECT_EQ(helped.size(), 12u);
+  EXPECT_EQ(matches(page, "\n\\.It Fl (?:h , )?-([a-z-]+)"), helped);
 }
 
 // --- form

@@ -113,7 +113,7 @@ std::vector<SeededFault> profileFaults() {
       {"ProfileBroken", text(R"({"sso_enable": true,})"), "file-syntax", "failure", kReadFailed,
        "a comma between", 1, Proof::kSameWords},
       {"ProfileTooDeep", text(std::string(2000, '[')), "file-syntax", "failure", kReadFailed,
-       "Mend", 1, Proof::kSameWords},
+       "Fix the text", 1, Proof::kSameWords},
       {"ProfileIsAList", text("[true]"), "file-no-object", "failure", kNotEnabled, "between {", 1,
        Proof::kSameWords},
       {"ProfileKeyTwice",
@@ -144,6 +144,8 @@ std::vector<SeededFault> profileFaults() {
        {5, 5, 0}},
       {"FolderWritable", [](Site&) { chmod(configPath("").c_str(), 01777); }, "folder-writable",
        "warning", "", "chmod 0755", 0, Proof::kSucceeds},
+      {"NoDescriptorsLeft", [](Site& s) { s.openFiles = 5; }, "check-failed", "unchecked", "",
+       "try again", 3, Proof::kNone},
       {"Disabled", [](Site& s) { s.profile["sso_enable"] = false; }, "sso-disabled", "failure",
        kNotEnabled, "to true", 1, Proof::kSameWords},
       {"EnableIsAText", [](Site& s) { s.profile["sso_enable"] = "true"; }, "key-wrong-type",
@@ -179,11 +181,11 @@ std::vector<SeededFault> settingsFileFaults() {
        kParseFailed, "double quotes", 1, Proof::kSameWords},
       {"SettingsOfTheOtherProviderBroken",
        [](Site&) { makeFile(configPath("websphere.conf"), 0600); }, "file-syntax", "warning", "",
-       "Mend", 0, Proof::kSucceeds},
+       "Fix the text", 0, Proof::kSucceeds},
       {"SecretReadableByAll", [](Site& s) { s.settingsMode = 0644; }, "secret-readable", "warning",
        "", "chmod 0600", 0, Proof::kSucceeds},
       {"SecretReadableByAGroup", [](Site& s) { s.settingsMode = 0640; }, "secret-readable",
-       "warning", "", "take a new client secret", 0, Proof::kSucceeds},
+       "warning", "", "set a new client secret", 0, Proof::kSucceeds},
       {"SettingsWritable", [](Site& s) { s.settingsMode = 0620; }, "file-writable", "warning", "",
        "chmod 0600", 0, Proof::kSucceeds},
       {"SettingsOfAnotherOwner", [](Site& s) { s.settingsOwner = 33; }, "file-writable", "warning",
@@ -193,15 +195,15 @@ std::vector<SeededFault> settingsFileFaults() {
          s.settings["azure_cleint_id"] = s.settings["azure_client_id"];
          s.settings.removeMember("azure_client_id");
        },
-       "key-unknown", "warning", "", "Rename it to \"azure_client_id\".", 1, Proof::kNone},
+       "key-unknown", "failure", "", "Rename it to \"azure_client_id\".", 1, Proof::kNone},
       {"KeyWithoutPrefix",
        [](Site& s) {
          s.settings["tenant_id"] = s.settings["azure_tenant_id"];
          s.settings.removeMember("azure_tenant_id");
        },
-       "key-unknown", "warning", "", "Rename it to \"azure_tenant_id\".", 1, Proof::kNone},
+       "key-unknown", "failure", "", "Rename it to \"azure_tenant_id\".", 1, Proof::kNone},
       {"KeyOfAnotherFile", [](Site& s) { s.settings["sso_enable"] = true; }, "key-unknown",
-       "warning", "", "belongs into profile.conf", 0, Proof::kSucceeds},
+       "warning", "", "belongs in profile.conf", 0, Proof::kSucceeds},
       {"ClientIdMissing", without("azure_client_id"), "key-missing", "failure", "client ID invalid",
        "\"azure_client_id\" to the client ID", 1, Proof::kSameWords},
       {"TenantMissing", without("azure_tenant_id"), "key-missing", "failure", "tenant ID invalid",
@@ -281,13 +283,13 @@ std::vector<SeededFault> valueFaults() {
          s.settings["azure_tenant_id"] = "0D3F6B1C-6F0A-4D7E-9B1E-5A2C7D8E9F00";
          s.discovery["issuer"] = "https://login.example.net/";
        },
-       "id-upper-case", "warning", "tenant ID invalid", "small letters", 0, Proof::kFails},
+       "id-upper-case", "warning", "tenant ID invalid", "lower case", 0, Proof::kFails},
       {"ClientIdInCapitals", set("azure_client_id", "7C1B2A3D-4E5F-4A6B-8C7D-9E0F1A2B3C4D"),
-       "id-upper-case", "warning", "client ID invalid", "small letters", 0, Proof::kFails},
+       "id-upper-case", "warning", "client ID invalid", "lower case", 0, Proof::kFails},
       {"SecretIsItsId", set("azure_client_secret", "11111111-2222-4333-8444-555555555555"),
        "secret-is-id", "warning", "", "shown once", 0, Proof::kSucceeds},
       {"SecretWithLineEnd", set("azure_client_secret", "kept between us two\n"), "secret-space",
-       "warning", "", "Remove them", 0, Proof::kSucceeds},
+       "warning", "", "Remove it", 0, Proof::kSucceeds},
       {"SecretShort",
        set("websphere_client_secret", "3k8f"),
        "secret-short",
@@ -345,19 +347,19 @@ std::vector<SeededFault> identityFaults() {
        [](Site& s) {
          s.user = {1000, 1000, 1000};
        },
-       "identity-not-checked", "unchecked", kRaise, "as root", 2, Proof::kNone},
+       "identity-not-checked", "unchecked", kRaise, "as root", 3, Proof::kNone},
       {"SettingsNotReadableForUs",
        [](Site& s) {
          s.user = {1000, 1000, 1000};
        },
-       "file-not-checked", "unchecked", "", "as root", 2, Proof::kNone},
+       "file-not-checked", "unchecked", "", "as root", 3, Proof::kNone},
       {"WithoutRights",
        [](Site& s) {
          prctl(PR_CAPBSET_DROP, CAP_SETGID, 0, 0, 0);
          s.arguments = {"--user", "www-data"};
        },
        "identity-not-checked", "unchecked", "cannot become www-data: Operation not permitted",
-       "all of root's rights", 2, Proof::kNone},
+       "all of root's capabilities", 3, Proof::kNone},
   };
 }
 
@@ -459,7 +461,7 @@ std::vector<SeededFault> networkFaults() {
          s.answers[kDiscovery] = ok("{\"jwks_uri\": \"https://localhost\"}");
          s.answers[kDiscovery].contentLength = 1000;
        },
-       "transfer-failed", "failure", "Transferred a partial file", "Look at the provider", 1,
+       "transfer-failed", "failure", "Transferred a partial file", "Check the provider", 1,
        Proof::kSameWords},
       {"KeySetNotReached",
        [](Site& s) {
@@ -493,13 +495,14 @@ std::vector<SeededFault> answerFaults() {
       {"DiscoveryWithoutKeys", [](Site& s) { s.discovery.removeMember("jwks_uri"); },
        "discovery-no-keys", "failure", kNoKey, "openid-configuration", 1, Proof::kSameWords},
       {"DiscoveryIsAnError", answer(kDiscovery, failed(400, R"({"error":"invalid_tenant"})")),
-       "discovery-no-keys", "failure", kNoKey, "Look at the configured URL", 1, Proof::kSameWords},
+       "discovery-no-keys", "failure", kNoKey, ".well-known/openid-configuration", 1,
+       Proof::kSameWords},
       {"DiscoveryNotUsed",
        [answer, page](Site& s) { answer(kDiscovery, ok(page))(s); },
        "discovery-no-json",
        "warning",
        "",
-       "configured URL",
+       "openid-configuration",
        0,
        Proof::kSucceeds,
        {0, 0, 0},
@@ -554,9 +557,9 @@ std::vector<SeededFault> answerFaults() {
          key["kid"].append("key-1");
          s.keys["keys"].insert(0, key);
        },
-       "keys-bad-kid", "failure", kNoText, "that are texts", 1, Proof::kSameWords},
+       "keys-bad-kid", "failure", kNoText, "that are strings", 1, Proof::kSameWords},
       {"KeyIdTwice", [](Site& s) { s.keys["keys"].append(s.keys["keys"][0]); }, "keys-same-kid",
-       "warning", "", "of its own", 0, Proof::kSucceeds},
+       "warning", "", "its own identifier", 0, Proof::kSucceeds},
       {"KeyShort",
        [](Site& s) {
          const RsaKey weak(1024);
@@ -569,13 +572,13 @@ std::vector<SeededFault> answerFaults() {
       {"TokenEndpointMoved", answer("/token", moved), "token-endpoint-redirect", "failure",
        kParseFailed, "redirects to", 1, Proof::kSameWords},
       {"TokenEndpointBroken", answer("/token", failed(503, page)), "token-endpoint-error",
-       "failure", kParseFailed, "error of its own", 1, Proof::kSameWords},
+       "failure", kParseFailed, "provider and its log", 1, Proof::kSameWords},
       {"TokenEndpointWrong", answer("/token", failed(404, page)), "token-endpoint-wrong", "failure",
-       kParseFailed, "no such page", 1, Proof::kSameWords},
+       kParseFailed, "token endpoint", 1, Proof::kSameWords},
       {"TokenEndpointIsAPage", answer("/token", ok(page)), "token-endpoint-no-json", "failure",
-       kParseFailed, "not a page for people", 1, Proof::kSameWords},
+       kParseFailed, "not to a page for people", 1, Proof::kSameWords},
       {"TokenEndpointRefusesInHtml", probe(failed(400, page)), "token-endpoint-no-json", "warning",
-       kParseFailed, "not a page for people", 0, Proof::kSucceeds},
+       kParseFailed, "not to a page for people", 0, Proof::kSucceeds},
       {"TokenEndpointOdd", probe(ok("{}")), "token-endpoint-odd", "warning",
        "we cannot find key 'id_token' in response!", "refuses an empty request", 0,
        Proof::kSucceeds},
@@ -584,7 +587,7 @@ std::vector<SeededFault> answerFaults() {
          s.answers["/token"] = failed(401, R"({"error":"invalid_client"})");
          s.arguments = {"--try-secret"};
        },
-       "secret-refused", "failure", "{\"error\":\"invalid_client\"}\n", "run out", 1,
+       "secret-refused", "failure", "{\"error\":\"invalid_client\"}\n", "expired there", 1,
        Proof::kSameWords},
       {"SecretRefusedByWebSphere",
        [](Site& s) {
@@ -594,7 +597,7 @@ std::vector<SeededFault> answerFaults() {
        "secret-refused",
        "failure",
        "we cannot find key 'id_token' in response!",
-       "run out",
+       "expired there",
        1,
        Proof::kSameWords,
        {0, 0, 0},
@@ -604,7 +607,7 @@ std::vector<SeededFault> answerFaults() {
          s.answers["/token"] = failed(400, R"({"error":"invalid_request"})");
          s.arguments = {"--try-secret"};
        },
-       "secret-not-checked", "unchecked", "", "Try a login", 2, Proof::kNone},
+       "secret-not-checked", "unchecked", "", "Try a sign-in", 3, Proof::kNone},
   };
 }
 
@@ -692,7 +695,7 @@ std::vector<SeededFault> azureTokenFaults() {
        1, Proof::kSameWords},
       {"TokenKeyUnknown", head("kid", "key-2"), "token-key-unknown", "failure", kNoKey,
        "key set above", 1, Proof::kSameWords},
-      {"TokenKeyIdIsAList", head("kid", list), "token-no-text", "failure", kNoText, "as texts", 1,
+      {"TokenKeyIdIsAList", head("kid", list), "token-no-text", "failure", kNoText, "as strings", 1,
        Proof::kSameWords},
       {"TokenKeyOfAnotherKind", token([](Site& s) {
          Json::Value key;
@@ -731,7 +734,7 @@ std::vector<SeededFault> azureTokenFaults() {
       {"TokenWithoutSettings", token([](Site& s) {
          s.user = {1000, 1000, 1000};
        }),
-       "token-not-checked", "unchecked", "", "Mend the files", 2, Proof::kNone},
+       "check-skipped", "unchecked", "", "", 3, Proof::kNone},
   };
 }
 
@@ -756,7 +759,7 @@ std::vector<SeededFault> webSphereTokenFaults() {
       {"HmacInSmallLetters", token([](Site& s) { s.header["alg"] = "hs256"; }), "token-algorithm",
        "failure", "hs256 algorithm is not supported", "HS256", 1, Proof::kSameWords},
       {"SubjectIsANumber", token([](Site& s) { s.claims["sub"] = 7; }), "token-no-name", "failure",
-       "cannot find the user name!", "\"sub\" as a text", 1, Proof::kSameWords},
+       "cannot find the user name!", "\"sub\" as a string", 1, Proof::kSameWords},
       {"AudienceInCapitals",
        token([](Site& s) { s.claims["aud"] = "7C1B2A3D-4E5F-4A6B-8C7D-9E0F1A2B3C4D"; }),
        "token-audience", "failure", "client ID invalid", "Set the client ID", 1, Proof::kSameWords},

@@ -22,14 +22,14 @@ struct SeededFault {
   std::string name;
   std::function<void(Site&)> seed;
   std::string id;
-  std::string severity;
+  std::string grade;
   std::string library;  // a text that the library throws or logs; empty: it does neither
-  std::string remedy;   // a part of it
+  std::string action;   // a part of it
   int status;
   Proof proof;
   Ids caller = {0, 0, 0};
   bool azure = true;
-  std::string seen = "";  // a part of it
+  std::string cause = "";  // a part of it
 };
 
 inline std::ostream& operator<<(std::ostream& out, const SeededFault& fault) {

@@ -5,6 +5,8 @@
 #include <grp.h>
 #include <json/reader.h>
 #include <json/writer.h>
+#include <pty.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -71,6 +73,10 @@ void install(const std::string& library) {
   if (ids.saved != 0 && setgroups(0, nullptr) != 0) _exit(126);
   if (setresgid(ids.real, ids.effective, ids.saved) != 0) _exit(126);
   if (setresuid(ids.real, ids.effective, ids.saved) != 0) _exit(126);
+  if (site.openFiles > 0) {
+    const struct rlimit limit = {site.openFiles, site.openFiles};
+    if (close_range(3, ~0U, 0) != 0 || setrlimit(RLIMIT_NOFILE, &limit) != 0) _exit(126);
+  }
   alarm(kLongestRun);
   execv("/usr/qova/bin/ssoclient-doctor", words.data());
   _exit(127);
@@ -181,6 +187,42 @@ std::vector<Json::Value> Outcome::findings(const std::string& id) const {
   return found;
 }
 
+// The output of the tool on a terminal, both streams together.
+class Terminal {
+ public:
+  explicit Terminal(unsigned short columns) {
+    struct winsize size = {};
+    size.ws_col = columns;
+    size.ws_row = 24;
+    require(openpty(&master, &slave, nullptr, nullptr, &size) == 0, "openpty");
+  }
+  ~Terminal() {
+    close(master);
+    if (slave >= 0) close(slave);
+  }
+  Terminal(const Terminal&) = delete;
+  Terminal& operator=(const Terminal&) = delete;
+
+  int end() const { return slave; }
+
+  std::string contents() {
+    close(slave);
+    slave = -1;
+    std::string text;
+    char chunk[4096];
+    // Ends with EIO when the tool has ended.
+    for (ssize_t count; (count = read(master, chunk, sizeof chunk)) > 0;) {
+      text.append(chunk, static_cast<size_t>(count));
+    }
+    text.erase(std::remove(text.begin(), text.end(), '\r'), text.end());
+    return text;
+  }
+
+ private:
+  int master = -1;
+  int slave = -1;
+};
+
 Outcome runDoctor(const Site& site, bool text) {
   install(site.withDirectory ? DIRECTORY_LIBRARY : STAGED_LIBRARY);
   std::vector<std::string> arguments = {"ssoclient-doctor"};
@@ -192,20 +234,23 @@ Outcome runDoctor(const Site& site, bool text) {
   const MemoryFile err;
   if (site.passToken) in.put(site.idToken() + "\n");
   lseek(in.descriptor(), 0, SEEK_SET);  // for the tool to read from the start
+  std::optional<Terminal> terminal;
+  if (site.columns > 0) terminal.emplace(site.columns);
   const pid_t child = fork();
   require(child >= 0, "fork");
   if (child == 0) {
     dup2(in.descriptor(), STDIN_FILENO);
-    dup2(out.descriptor(), STDOUT_FILENO);
-    dup2(err.descriptor(), STDERR_FILENO);
+    dup2(terminal ? terminal->end() : out.descriptor(), STDOUT_FILENO);
+    dup2(terminal ? terminal->end() : err.descriptor(), STDERR_FILENO);
     execDoctor(site, arguments);
   }
   Outcome run;
+  const std::string shown = terminal ? terminal->contents() : "";
   int status = 0;
   while (waitpid(child, &status, 0) < 0 && errno == EINTR) {
   }
   run.status = WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
-  run.out = out.contents();
+  run.out = terminal ? shown : out.contents();
   run.err = err.contents();
   const bool json = !text && !run.out.empty() && run.out[0] == '{';
   if (json) run.document = parsed(run.out);

@@ -63,6 +63,8 @@ class Site {
   bool passToken = false;  // on standard input
   std::map<std::string, std::string> environment;
   Ids user = {0, 0, 0};
+  unsigned openFiles = 0;      // the limit; 0: as it is
+  unsigned short columns = 0;  // of a terminal for its output; 0: none
   bool withDirectory = false;  // the library with the platform of support/platform_directory.c
 
   // Writes the files and starts the provider. For a login it gives out the token; for the doctor

@@ -130,9 +130,15 @@ Identity Ca::issue(const std::vector<std::string>& names, Validity validity) con
   return asPem(certificate.get(), own.get());
 }
 
-Identity selfSigned(const std::vector<std::string>& names) {
+Identity selfSigned(const std::vector<std::string>& names, const std::string& description) {
   const auto own = newKey();
   const auto certificate = newCertificate(own.get(), names.at(0), Validity::kNow);
+  if (!description.empty()) {
+    require(X509_NAME_add_entry_by_txt(
+                X509_get_subject_name(certificate.get()), "description", MBSTRING_UTF8,
+                reinterpret_cast<const unsigned char*>(description.c_str()), -1, -1, 0) == 1,
+            "description");
+  }
   extend(certificate.get(), certificate.get(), NID_subject_alt_name, alternativeNames(names));
   sign(certificate.get(), certificate.get(), own.get());
   return asPem(certificate.get(), own.get());

@@ -38,7 +38,7 @@ class Ca {
   std::shared_ptr<X509> self;
 };
 
-// A server certificate that is its own issuer.
-Identity selfSigned(const std::vector<std::string>& names);
+// A server certificate that is its own issuer; its subject has the description, if there is one.
+Identity selfSigned(const std::vector<std::string>& names, const std::string& description = "");
 
 }  // namespace test

@@ -1,0 +1,35 @@
+// A configuration file as it was found.
+#pragma once
+
+#include <sys/stat.h>
+
+#include <string>
+
+#include "doctor/checkup.h"
+#include "doctor/keys.h"
+
+namespace doctor {
+
+struct File {
+  const FileKind& kind;
+  std::string path;
+  int error = 0;  // errno of the failed open or read; 0: `text` holds the file
+  struct stat status = {};
+  std::string text = {};
+
+  Place At(const std::string& key = "") const { return {path, key}; }
+};
+
+extern const char kFolder[];
+
+// Reads the file without waiting for whatever it may be.
+File Load(const FileKind& kind);
+
+// Adds what is wrong with the file, its mode and its JSON. True if it holds a JSON object, which
+// is then in `document`. `in_use`: a sign-in needs the file.
+bool CheckFile(Checkup& checkup, const File& file, bool in_use, Json::Value& document);
+
+// "0644"
+std::string Mode(const struct stat& status);
+
+}  // namespace doctor
