@@ -11,17 +11,18 @@ import sys
 
 import forward
 from browser import BrowserError
+from narrate import Narrator
 from providers.entra import Entra
 from providers.glewlwyd import Glewlwyd
 from providers.lemonldap import LemonLDAP
 from providers.liberty import Liberty
 from scene import DEVICE, PROVIDER, Scene, StepError, say, show_logs
-from stage import Stage, StageError
+from stage import WWW, Stage, StageError
 
 PROVIDERS = {"glewlwyd": Glewlwyd, "lemonldap": LemonLDAP, "entra": Entra, "liberty": Liberty}
 
 
-def serve(scene, profile, sockets):
+def serve(scene, narrator, profile, sockets):
     titles = [title for title, setup in scene.provider.setups.items() if setup[0] == profile]
     if not titles:
         raise StageError(f"{scene.provider.title} has no sign-in for the profile {profile}")
@@ -41,8 +42,9 @@ of the machine where it runs:
 Only this machine is listened to. From another one, let ssh carry both ports:
   ssh -L {scene.stage.device_port}:127.0.0.1:{scene.stage.device_port} \
 -L {scene.stage.provider_port}:127.0.0.1:{scene.stage.provider_port} USER@THIS-MACHINE
-Ctrl-C ends it.
+Ctrl-C ends it. What happens from now on:
 """, flush=True)
+    narrator.begin(scene.settings[titles[-1]])
     while True:
         signal.pause()
 
@@ -74,6 +76,7 @@ def read_options():
     parser.add_argument("--provider", choices=PROVIDERS, default="glewlwyd")
     parser.add_argument("--screenshots")
     parser.add_argument("--serve", choices=("azure", "websphere"))
+    parser.add_argument("--login")
     parser.add_argument("--sockets", type=int, nargs=2)
     return parser.parse_args()
 
@@ -86,10 +89,13 @@ def main():
 
     stage = Stage(DEVICE, PROVIDER, options.port, options.port + 1)
     scene = Scene(stage, PROVIDERS[options.provider])
+    narrator = Narrator(stage) if options.serve else None
     try:
-        scene.set_up(options.prefix, options.programs, options.pages)
+        scene.set_up(options.prefix, options.programs, options.pages, narrator)
+        if options.login:
+            stage.install_login(options.login, WWW + "/webman/login.cgi", 0o4750)
         if options.serve:
-            serve(scene, options.serve, options.sockets)
+            serve(scene, narrator, options.serve, options.sockets)
         else:
             visits(scene, options.screenshots)
         return 0

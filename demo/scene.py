@@ -74,9 +74,11 @@ class Scene:
         self.settings = {}
         self.users = {"azure": "PLANT7.EXAMPLE.NET\\alice", "websphere": "alice"}
 
-    def set_up(self, prefix, programs, pages):
+    def set_up(self, prefix, programs, pages, narrator=None):
         say("device: private names, certificate authority, system log")
         self.stage.build()
+        if narrator is not None:
+            narrator.set_up()
         say(f"device: library, login program (set-id root), web server on {self.stage.device}")
         self.stage.install(prefix, programs, pages)
         self.server = Lighttpd(self.stage)
