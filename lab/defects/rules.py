@@ -5,7 +5,9 @@ from pathlib import Path
 
 SOURCES = [
     "sso/azuresso.cpp", "sso/jwt.cpp", "sso/profile.cpp", "sso/sso.cpp", "sso/utils.cpp",
-    "sso/webspheresso.cpp", "sso/internal/provider.cpp", "sso/internal/libcurl.cpp", "sso/internal/http_body.h", "sso/internal/nonce.h",
+    "sso/webspheresso.cpp", "sso/common.cpp", "sso/internal/provider.cpp",
+    "sso/internal/encoding.cpp", "sso/internal/file.cpp", "sso/internal/json.cpp",
+    "sso/internal/libcurl.cpp", "sso/internal/http_body.h", "sso/internal/nonce.cpp",
     "sso/privilege.h", "sso/internal/split.h", "sso/common.h", "sso/sso.h", "sso/profile.h", "sso/azuresso.h",
     "platform/encoding.c", "platform/passthrough.c",
 ]

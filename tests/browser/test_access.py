@@ -200,6 +200,15 @@ class Pages(Scenario):
 
     # -- languages, keyboard -------------------------------------------------------------------
 
+    def test_head_of_the_front_page(self):
+        page = self.browser.get(self.device.front_url)
+        self.assertEqual(page.headers.get_all("Content-Security-Policy")[0],
+                         "default-src 'none'; style-src 'self'; img-src 'self'; base-uri 'none'; "
+                         "form-action 'self' https:; frame-ancestors 'none'")
+        self.assertEqual(page.headers["Cache-Control"], "no-store")
+        self.assertEqual(set(page.headers.get_all("Referrer-Policy")), {"same-origin"})
+        self.assertNotRegex(page.body, "<script|<style|style=| on[a-z]+=")
+
     def test_front_page_in_every_language(self):
         """What its programs choose is what the relay page's script would."""
         for accepted, expected in (("de-AT,de", "de"), ("en-US,en", "en"), ("fr,de,en", "de"),
@@ -212,6 +221,17 @@ class Pages(Scenario):
                 self.assertEqual(self.tab.find("#sign-in").text, words["sign-in-with"].replace(
                     "{provider}", words["provider"]))
                 self.assertEqual(self.tab.script("return document.documentElement.lang"), expected)
+
+    def test_weights_of_languages(self):
+        for accepted, expected in (
+                ("de;q=0.5, en;q=0.4", "de"), ("en;q=0.4,de;q=0.5", "de"), ("de;q=0", "en"),
+                ("de;q=0.001", "de"), ("*", "en"), ("", "en"), (",,;q=,-,=", "en"), ("de;q=x,en", "en"),
+                ("de;q=1e9", "de"), ("en;q=nan,de", "de"), ("de" + ";" * 4000, "de"), ("DE", "de"),
+                ("x," * 2000 + "de", "en"), ("\u00e9,de".encode().decode("latin-1"), "de")):
+            with self.subTest(accepted=accepted[:40]):
+                page = self.browser.get(self.device.front_url, {"Accept-Language": accepted})
+                self.assertEqual(page.status, 200)
+                self.assertIn(f'<html lang="{expected}" dir="ltr">', page.body)
 
     def test_name_of_the_provider(self):
         for name in ("Example ID", "<b>R&D</b> \"ID\"", "{user} $& \u0645\u0632\u0648\u062f"):

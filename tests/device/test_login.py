@@ -284,7 +284,7 @@ class Callback(DeviceTest):
         page = self.browser.get(url, shows)
         self.assertEqual(page.status, 200)
         self.assertIn("default-src 'none'", page.headers["Content-Security-Policy"])
-        target = re.search('content="0;url=([^"]*)"', page.body)[1].replace("&amp;", "&")
+        target = page.headers["Refresh"].split("; url=")[1]
         self.assertEqual(target, url[len(self.device.stage.device):] + "&go=1")
         stranger = self.new_browser()
         self.assert_refused(stranger.get(url, shows), "expired",

@@ -13,7 +13,7 @@
 #include <string>
 #include <vector>
 
-#include "support/clients.h"
+#include "support/both_clients.h"
 #include "support/faults.h"
 #include "support/log.h"
 #include "support/query.h"
@@ -33,18 +33,18 @@ bool no_getrandom = false;
 int interruptions = 0;  // of getrandom, to come
 
 template <typename Function>
-Function* Next(const char* name) {
+Function* real(const char* name) {
   return reinterpret_cast<Function*>(dlsym(RTLD_NEXT, name));
 }
 
-bool IsSource(int file, const void* caller) {
+bool isSource(int file, const void* caller) {
   return file >= 0 && file == source && test::isFromLibrary(caller);
 }
 
 }  // namespace
 
 extern "C" int open(const char* path, int flags, ...) {
-  static auto* const next = Next<int(const char*, int, ...)>("open");
+  static auto* const next = real<int(const char*, int, ...)>("open");
   va_list arguments;
   va_start(arguments, flags);
   const mode_t mode = (flags & O_CREAT) != 0 ? va_arg(arguments, mode_t) : 0;
@@ -60,8 +60,8 @@ extern "C" int open(const char* path, int flags, ...) {
 }
 
 extern "C" ssize_t read(int file, void* bytes, size_t size) {
-  static auto* const next = Next<ssize_t(int, void*, size_t)>("read");
-  if (!IsSource(file, __builtin_return_address(0))) return next(file, bytes, size);
+  static auto* const next = real<ssize_t(int, void*, size_t)>("read");
+  if (!isSource(file, __builtin_return_address(0))) return next(file, bytes, size);
   reads.push_back(size);
   if (!limited) return next(file, bytes, size);
   if (limit < 0) errno = EIO;
@@ -69,8 +69,8 @@ extern "C" ssize_t read(int file, void* bytes, size_t size) {
 }
 
 extern "C" int close(int file) {
-  static auto* const next = Next<int(int)>("close");
-  if (IsSource(file, __builtin_return_address(0))) {
+  static auto* const next = real<int(int)>("close");
+  if (isSource(file, __builtin_return_address(0))) {
     ++closed;
     source = -1;
   }
@@ -79,13 +79,13 @@ extern "C" int close(int file) {
 
 extern "C" unsigned char* MD5(const unsigned char* bytes, size_t size, unsigned char* digest) {
   static auto* const next =
-      Next<unsigned char*(const unsigned char*, size_t, unsigned char*)>("MD5");
+      real<unsigned char*(const unsigned char*, size_t, unsigned char*)>("MD5");
   if (test::failsNow("MD5", __builtin_return_address(0))) return nullptr;
   return next(bytes, size, digest);
 }
 
 extern "C" ssize_t getrandom(void* bytes, size_t size, unsigned flags) {
-  static auto* const next = Next<ssize_t(void*, size_t, unsigned)>("getrandom");
+  static auto* const next = real<ssize_t(void*, size_t, unsigned)>("getrandom");
   const bool ours = test::isFromLibrary(__builtin_return_address(0));
   if (!ours || (!no_getrandom && interruptions == 0)) return next(bytes, size, flags);
   errno = no_getrandom ? ENOSYS : EINTR;
@@ -98,14 +98,14 @@ namespace {
 template <typename Provider>
 class ClientNonce : public testing::Test {
  protected:
-  std::string Nonce() {
+  std::string nonce() {
     const std::string url = client.GetAccessTokenReqURI(Json::Value());
     return url.substr(url.find("nonce=") + 6, 36);
   }
 
-  void ExpectDifferentNonces() {
+  void expectDifferentNonces() {
     std::set<std::string> nonces;
-    for (int i = 0; i < 20; ++i) nonces.insert(Nonce());
+    for (int i = 0; i < 20; ++i) nonces.insert(nonce());
     EXPECT_EQ(nonces.size(), 20u);
   }
 
@@ -128,7 +128,7 @@ TYPED_TEST_SUITE(ClientNonce, test::Clients, test::ClientName);
 
 TYPED_TEST(ClientNonce, IsSeededAnewForEachCallWithOneRead) {
   for (int i = 1; i <= 3; ++i) {
-    this->Nonce();
+    this->nonce();
     EXPECT_EQ(opened, i);
     EXPECT_EQ(reads.size(), static_cast<size_t>(i));
   }
@@ -138,7 +138,7 @@ TYPED_TEST(ClientNonce, IsSeededAnewForEachCallWithOneRead) {
 TYPED_TEST(ClientNonce, IsMadeWithoutTheDevice) {
   for (int i = 0; i < 5; ++i) {
     test::Fault fault("open");
-    EXPECT_EQ(this->Nonce().size(), 36u);
+    EXPECT_EQ(this->nonce().size(), 36u);
     EXPECT_TRUE(fault.wasHit());
   }
   EXPECT_EQ(opened, 0);
@@ -149,7 +149,7 @@ TYPED_TEST(ClientNonce, IsRandomWhenTheDeviceCannotBeRead) {
   for (ssize_t count : {-1, 0, 1}) {
     limit = count;
     SCOPED_TRACE(count);
-    this->ExpectDifferentNonces();
+    this->expectDifferentNonces();
   }
 }
 
@@ -157,7 +157,7 @@ TYPED_TEST(ClientNonce, IsRandomWhenTheKernelIsInterrupted) {
   limited = true;
   limit = -1;
   interruptions = 3;
-  this->ExpectDifferentNonces();
+  this->expectDifferentNonces();
   EXPECT_EQ(interruptions, 0);
 }
 
@@ -165,7 +165,7 @@ TYPED_TEST(ClientNonce, IsMadeWithoutAnySourceOfRandomness) {
   limited = true;
   limit = -1;
   no_getrandom = true;
-  EXPECT_EQ(this->Nonce().size(), 36u);
+  EXPECT_EQ(this->nonce().size(), 36u);
 }
 
 // The digest is empty then, and the request goes on.

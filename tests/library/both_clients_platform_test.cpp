@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "support/clients.h"
+#include "support/both_clients.h"
 #include "support/device.h"
 #include "support/log.h"
 #include "support/platform_spy.h"
@@ -182,7 +182,7 @@ class WebSphereKeyPlatform : public testing::Test {
   WebSphereKeyPlatform() { platformSpy() = {}; }
 
   // Verifies a token under the configured secret "s3cret".
-  static void Verify(const std::string& header, const std::string& body) {
+  static void verify(const std::string& header, const std::string& body) {
     test::writeConfig("websphere.conf",
                       R"({"websphere_client_id":"id", "websphere_client_secret":"s3cret"})");
     WebSphereSSOClient client;
@@ -196,7 +196,7 @@ class WebSphereKeyPlatform : public testing::Test {
 };
 
 TEST_F(WebSphereKeyPlatform, EncodesTheClientSecretIntoAZeroedBufferOf1024) {
-  EXPECT_NO_THROW(Verify(header, body));
+  EXPECT_NO_THROW(verify(header, body));
   ASSERT_EQ(platformSpy().base64Encode.size(), 1u);
   const test::PlatformCall& call = platformSpy().base64Encode[0];
   EXPECT_EQ(call.input, "s3cret");
@@ -207,7 +207,7 @@ TEST_F(WebSphereKeyPlatform, EncodesTheClientSecretIntoAZeroedBufferOf1024) {
 
 TEST_F(WebSphereKeyPlatform, ThrowsWhenTheClientSecretCannotBeEncoded) {
   platformSpy().onBase64Encode = [](const std::string&, char*, size_t) { return 0; };
-  EXPECT_TRUE(throws<sso_op_failed>("encode base64 failed.", [&] { Verify(header, body); }));
+  EXPECT_TRUE(throws<sso_op_failed>("encode base64 failed.", [&] { verify(header, body); }));
 }
 
 TEST_F(WebSphereKeyPlatform, TakesTheKeyFromWhatThePlatformWrote) {
@@ -216,16 +216,16 @@ TEST_F(WebSphereKeyPlatform, TakesTheKeyFromWhatThePlatformWrote) {
     return 1;
   };
   EXPECT_TRUE(
-      throws<jwt_verify_failed>("verify hmac signature failed", [&] { Verify(header, body); }));
+      throws<jwt_verify_failed>("verify hmac signature failed", [&] { verify(header, body); }));
 }
 
 TEST_F(WebSphereKeyPlatform, IsNotAskedBeforeTheOtherChecks) {
   EXPECT_TRUE(throws<std::invalid_argument>("id_token expired.",
-                                            [&] { Verify(header, R"({"aud":"id", "exp":1})"); }));
+                                            [&] { verify(header, R"({"aud":"id", "exp":1})"); }));
   EXPECT_TRUE(throws<std::invalid_argument>(
-      "client ID invalid", [&] { Verify(header, R"({"aud":"x", "exp":4102444800})"); }));
+      "client ID invalid", [&] { verify(header, R"({"aud":"x", "exp":4102444800})"); }));
   EXPECT_TRUE(throws<jwt_not_support>("none algorithm is not supported",
-                                      [&] { Verify(R"({"alg":"none"})", body); }));
+                                      [&] { verify(R"({"alg":"none"})", body); }));
   EXPECT_TRUE(platformSpy().base64Encode.empty());
 }
 

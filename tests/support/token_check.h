@@ -8,7 +8,7 @@
 #include <cstdio>
 #include <string>
 
-#include "support/clients.h"
+#include "support/both_clients.h"
 #include "support/device.h"
 #include "support/log.h"
 #include "support/throws.h"
@@ -16,8 +16,8 @@
 
 namespace test {
 
-const char kBenchSecret[] = "s3cret of the device";
-const char kBenchBody[] =
+const char kCheckSecret[] = "s3cret of the device";
+const char kCheckBody[] =
     R"({"exp":4102444800,"tid":"the tenant","aud":"the device","sub":"Alice",)"
     R"("unique_name":"Alice@corp.example.com"})";
 
@@ -59,12 +59,12 @@ struct Signing<WebSphere> {
   static const char* failed() { return "verify hmac signature failed"; }
   static std::string sign(const std::string& header, const std::string& body,
                           const std::string& digest) {
-    return hmacToken(kBenchSecret, header, body, "HS" + digest);
+    return hmacToken(kCheckSecret, header, body, "HS" + digest);
   }
 };
 
 template <typename Provider>
-class Bench : public testing::Test {
+class TokenCheck : public testing::Test {
  protected:
   using Client = typename Provider::Client;
   using Sign = Signing<Provider>;
@@ -72,7 +72,7 @@ class Bench : public testing::Test {
   void SetUp() override {
     settings["client_id"] = "the device";
     settings["tenant_id"] = "the tenant";
-    settings["client_secret"] = kBenchSecret;
+    settings["client_secret"] = kCheckSecret;
     settings["wellknown"] = address("discovery");
     configure<Provider>(settings);
     writeConfig("discovery", "{\"issuer\":\"x\",\"jwks_uri\":\"" + address("keys") + "\"}");
@@ -86,7 +86,7 @@ class Bench : public testing::Test {
     return R"({"alg":")" + alg + R"(","kid":"the key"})";
   }
   static std::string goodHeader() { return header(std::string(Sign::family()) + "256"); }
-  static std::string token(const std::string& header, const std::string& body = kBenchBody,
+  static std::string token(const std::string& header, const std::string& body = kCheckBody,
                            const std::string& digest = "256") {
     return Sign::sign(header, body, digest);
   }

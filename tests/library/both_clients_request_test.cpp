@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "support/clients.h"
+#include "support/both_clients.h"
 #include "support/device.h"
 #include "support/log.h"
 #include "support/query.h"
@@ -47,27 +47,27 @@ class ClientRequest : public testing::Test {
 
   void TearDown() override { EXPECT_TRUE(log.isEmpty()); }
 
-  static std::string URL(const Json::Value& parameters = Json::Value()) {
+  static std::string url(const Json::Value& parameters = Json::Value()) {
     typename Provider::Client client;
     return client.GetAccessTokenReqURI(parameters);
   }
 
   // Takes a URL apart; the test fails unless it has exactly the expected form.
-  static Request Ask(const Json::Value& parameters) {
-    const std::string url = URL(parameters);
+  static Request ask(const Json::Value& parameters) {
+    const std::string whole = url(parameters);
     const std::string value = std::string("((?:") + kUnreserved + ")*)";
     const std::regex form(std::string("https://provider\\.example\\.com/authorize\\?client_id=") +
                           kClientID + "&nonce=([0-9a-f-]{36})&redirect_uri=" + kRedirectURI +
                           "&response_type=code&scope=" + Provider::scope() + "&state=" + value);
     std::smatch found;
-    EXPECT_TRUE(std::regex_match(url, found, form)) << url;
+    EXPECT_TRUE(std::regex_match(whole, found, form)) << whole;
     if (found.empty()) return {};
     return {found[1], test::fromBase64(test::percentDecoded(found[2]))};
   }
 
   // The state of a request, without its nonce, which is checked.
-  static std::string StateWithoutNonce(const Json::Value& parameters) {
-    const Request request = Ask(parameters);
+  static std::string stateWithoutNonce(const Json::Value& parameters) {
+    const Request request = ask(parameters);
     const std::string nonce = "\"nonce\":\"" + test::md5(request.nonce) + "\"";
     const size_t at = request.state.find(nonce);
     EXPECT_NE(at, std::string::npos) << request.state;
@@ -76,7 +76,7 @@ class ClientRequest : public testing::Test {
   }
 
   // An object whose state is a JSON text of `length` bytes, the line feed at its end included.
-  static Json::Value ParametersOfLength(size_t length) {
+  static Json::Value parametersOfLength(size_t length) {
     const std::string rest = R"({"nonce":"0123456789abcdef0123456789abcdef","origin":""})";
     Json::Value parameters;
     parameters["origin"] = std::string(length - rest.size() - 1, 'x');
@@ -88,20 +88,20 @@ class ClientRequest : public testing::Test {
 TYPED_TEST_SUITE(ClientRequest, test::Clients, test::ClientName);
 
 TYPED_TEST(ClientRequest, HasItsSixParametersInTheOrderOfTheirNames) {
-  const std::string url = this->URL();
+  const std::string url = this->url();
   std::vector<std::string> names;
   for (const auto& parameter : test::parametersOf(url.substr(url.find('?') + 1)))
     names.push_back(parameter.first);
   EXPECT_EQ(names, (std::vector<std::string>{"client_id", "nonce", "redirect_uri", "response_type",
                                              "scope", "state"}));
-  EXPECT_FALSE(this->Ask(Json::Value()).nonce.empty()) << "the exact form";
+  EXPECT_FALSE(this->ask(Json::Value()).nonce.empty()) << "the exact form";
 }
 
 // RFC 4122, sections 3 and 4.4: version 4, the variant of that document.
 TYPED_TEST(ClientRequest, HasARandomUuidAsNonce) {
   const std::regex uuid("[0-9a-f]{8}-[0-9a-f]{4}-4[0-9a-f]{3}-[89ab][0-9a-f]{3}-[0-9a-f]{12}");
   for (int i = 0; i < 50; ++i) {
-    const std::string nonce = this->Ask(Json::Value()).nonce;
+    const std::string nonce = this->ask(Json::Value()).nonce;
     EXPECT_TRUE(std::regex_match(nonce, uuid)) << nonce;
   }
 }
@@ -110,7 +110,7 @@ TYPED_TEST(ClientRequest, HasAFreshNonceAndStateEachTime) {
   std::set<std::string> nonces;
   std::set<std::string> states;
   for (int i = 0; i < 200; ++i) {
-    const Request request = this->Ask(Json::Value());
+    const Request request = this->ask(Json::Value());
     nonces.insert(request.nonce);
     states.insert(request.state);
   }
@@ -122,7 +122,7 @@ TYPED_TEST(ClientRequest, HasAFreshNonceAndStateEachTime) {
 TYPED_TEST(ClientRequest, HasANonceThatIsRandomInEveryDigit) {
   std::array<std::set<char>, 36> seen;
   for (int i = 0; i < 500; ++i) {
-    const std::string url = this->URL();
+    const std::string url = this->url();
     const std::string nonce = url.substr(url.find("nonce=") + 6, 36);
     for (size_t at = 0; at < seen.size(); ++at) seen[at].insert(nonce[at]);
   }
@@ -133,7 +133,7 @@ TYPED_TEST(ClientRequest, HasANonceThatIsRandomInEveryDigit) {
 }
 
 TYPED_TEST(ClientRequest, CarriesTheDigestOfTheNonceAloneForNull) {
-  const Request request = this->Ask(Json::Value());
+  const Request request = this->ask(Json::Value());
   EXPECT_EQ(request.state, "{\"nonce\":\"" + test::md5(request.nonce) + "\"}\n");
 }
 
@@ -141,14 +141,14 @@ TYPED_TEST(ClientRequest, CarriesTheCallersObject) {
   Json::Value parameters;
   parameters["origin"] = "/webman/index.cgi";
   parameters["zone"]["deep"].append(1);
-  EXPECT_EQ(this->StateWithoutNonce(parameters),
+  EXPECT_EQ(this->stateWithoutNonce(parameters),
             "{N,\"origin\":\"/webman/index.cgi\",\"zone\":{\"deep\":[1]}}\n");
 }
 
 TYPED_TEST(ClientRequest, EscapesWhatIsNotAsciiInTheState) {
   Json::Value parameters;
   parameters["origin"] = "/M\xc3\xbcnchen/\xf0\x9f\x98\x80";
-  EXPECT_EQ(this->StateWithoutNonce(parameters),
+  EXPECT_EQ(this->stateWithoutNonce(parameters),
             "{N,\"origin\":\"/M\\u00fcnchen/\\ud83d\\ude00\"}\n");
 }
 
@@ -156,7 +156,7 @@ TYPED_TEST(ClientRequest, ReplacesANonceOfTheCaller) {
   Json::Value parameters;
   for (const Json::Value& nonce : {Json::Value("mine"), Json::Value(5), Json::Value()}) {
     parameters["nonce"] = nonce;
-    EXPECT_EQ(this->StateWithoutNonce(parameters), "{N}\n");
+    EXPECT_EQ(this->stateWithoutNonce(parameters), "{N}\n");
     EXPECT_EQ(parameters["nonce"], nonce) << "the caller's object is copied";
   }
 }
@@ -165,21 +165,21 @@ TYPED_TEST(ClientRequest, TreatsWhatIsNotAnObjectAsNull) {
   for (const Json::Value& parameters :
        {Json::Value(), Json::Value(5), Json::Value("text"), Json::Value(true),
         Json::Value(Json::arrayValue), Json::Value(Json::objectValue)}) {
-    EXPECT_EQ(this->StateWithoutNonce(parameters), "{N}\n") << parameters.toStyledString();
+    EXPECT_EQ(this->stateWithoutNonce(parameters), "{N}\n") << parameters.toStyledString();
   }
   Json::Value list;
   list.append("x");
-  EXPECT_EQ(this->StateWithoutNonce(list), "{N}\n");
+  EXPECT_EQ(this->stateWithoutNonce(list), "{N}\n");
 }
 
 TYPED_TEST(ClientRequest, FitsAStateOf765Bytes) {
-  EXPECT_EQ(this->Ask(this->ParametersOfLength(765)).state.size(), 765u);
+  EXPECT_EQ(this->ask(this->parametersOfLength(765)).state.size(), 765u);
 }
 
 TYPED_TEST(ClientRequest, ThrowsForAStateOf766Bytes) {
   for (size_t length : {766u, 767u, 768u, 769u, 100000u}) {
     EXPECT_TRUE(throws<sso_op_failed>("encode base64 failed.", [&] {
-      this->URL(this->ParametersOfLength(length));
+      this->url(this->parametersOfLength(length));
     })) << length;
   }
 }
@@ -189,7 +189,7 @@ TYPED_TEST(ClientRequest, UsesTheEndpointAsItIs) {
     Json::Value settings = Settings();
     settings["authorization_endpoint"] = endpoint;
     test::configure<TypeParam>(settings);
-    EXPECT_EQ(this->URL().find(std::string(endpoint) + "?client_id="), 0u) << endpoint;
+    EXPECT_EQ(this->url().find(std::string(endpoint) + "?client_id="), 0u) << endpoint;
   }
 }
 
@@ -198,7 +198,7 @@ TYPED_TEST(ClientRequest, DoesNotRefuseEmptySettings) {
   const std::regex form(
       "\\?client_id=&nonce=[0-9a-f-]{36}&redirect_uri=&response_type=code&scope=" +
       TypeParam::scope() + "&state=.+");
-  EXPECT_TRUE(std::regex_match(this->URL(), form));
+  EXPECT_TRUE(std::regex_match(this->url(), form));
   typename TypeParam::Client client;
   EXPECT_EQ(client.GetIDTokenReqParams(),
             "client_id=&client_secret=&code=&grant_type=authorization_code&redirect_uri=");
@@ -239,7 +239,7 @@ TYPED_TEST(ClientRequest, IsWrittenToStandardOutput) {
 
 TYPED_TEST(ClientRequest, WritesNothingWhenTheUrlCannotBeMade) {
   typename TypeParam::Client client;
-  const Json::Value parameters = this->ParametersOfLength(766);
+  const Json::Value parameters = this->parametersOfLength(766);
   test::CoutRecorder out;
   EXPECT_TRUE(throws<sso_op_failed>("encode base64 failed.",
                                     [&] { client.RedirectAuthEndpoint(parameters); }));

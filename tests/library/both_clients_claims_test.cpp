@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "support/clients.h"
+#include "support/both_clients.h"
 #include "support/clock.h"
 #include "support/log.h"
 #include "support/throws.h"
@@ -22,7 +22,7 @@ const char kWrongAudience[] = "client ID invalid";
 
 // The first check behind that of the expiry.
 template <typename Provider>
-std::string CheckBehindExpiry() {
+std::string checkBehindExpiry() {
   return Provider::name() == "azure" ? "tenant ID invalid" : kWrongAudience;
 }
 
@@ -39,7 +39,7 @@ class IdTokenClaims : public testing::Test {
 
   void TearDown() override { EXPECT_TRUE(log.isEmpty()); }
 
-  static void VerifyToken(const std::string& token) {
+  static void verifyToken(const std::string& token) {
     typename Provider::Client client;
     Json::Value response;
     response["id_token"] = token;
@@ -49,11 +49,11 @@ class IdTokenClaims : public testing::Test {
   }
 
   static void VerifyClaims(const std::string& body, const std::string& header = "{}") {
-    VerifyToken(signingInput(header, body) + ".c2ln");
+    verifyToken(signingInput(header, body) + ".c2ln");
   }
 
   // The message for a body with this "exp" and nothing else that is right.
-  static std::string MessageForExpiry(const std::string& exp) {
+  static std::string messageForExpiry(const std::string& exp) {
     try {
       VerifyClaims("{\"exp\":" + exp + "}");
     } catch (const std::invalid_argument& e) {
@@ -72,29 +72,29 @@ TYPED_TEST(IdTokenClaims, NeedAToken) {
     client.VerifyIDToken();
   }));
   EXPECT_TRUE(
-      throws<std::invalid_argument>("token cannot be empty", [&] { this->VerifyToken(""); }));
+      throws<std::invalid_argument>("token cannot be empty", [&] { this->verifyToken(""); }));
 }
 
 TYPED_TEST(IdTokenClaims, NeedThreeSegments) {
   for (const char* token : {"a", "a.b", "a.b.c.d", "."})
     EXPECT_TRUE(
-        throws<std::invalid_argument>("bad jwt format!", [&] { this->VerifyToken(token); }));
+        throws<std::invalid_argument>("bad jwt format!", [&] { this->verifyToken(token); }));
 }
 
 TYPED_TEST(IdTokenClaims, NeedAHeaderThenABodyThatCanBeRead) {
   const std::string json = test::base64url("{}");
   for (const char* bad : {"!!!!", "A", "aGVsbG8"}) {
     EXPECT_TRUE(throws<std::invalid_argument>(
-        "bad jwt header format!", [&] { this->VerifyToken(std::string(bad) + "." + bad + ".s"); }));
+        "bad jwt header format!", [&] { this->verifyToken(std::string(bad) + "." + bad + ".s"); }));
     EXPECT_TRUE(throws<std::invalid_argument>("bad jwt body format!",
-                                              [&] { this->VerifyToken(json + "." + bad + ".s"); }));
+                                              [&] { this->verifyToken(json + "." + bad + ".s"); }));
   }
 }
 
 TYPED_TEST(IdTokenClaims, InAnEmptySegmentAreALogicError) {
-  EXPECT_TRUE(throws<std::logic_error>([&] { this->VerifyToken(".!!!!."); }));
-  EXPECT_TRUE(throws<std::logic_error>([&] { this->VerifyToken("e30.."); }));
-  EXPECT_TRUE(throws<std::logic_error>([&] { this->VerifyToken(".."); }));
+  EXPECT_TRUE(throws<std::logic_error>([&] { this->verifyToken(".!!!!."); }));
+  EXPECT_TRUE(throws<std::logic_error>([&] { this->verifyToken("e30.."); }));
+  EXPECT_TRUE(throws<std::logic_error>([&] { this->verifyToken(".."); }));
 }
 
 TYPED_TEST(IdTokenClaims, AreMissingInABodyThatIsNotAnObject) {
@@ -105,7 +105,7 @@ TYPED_TEST(IdTokenClaims, AreMissingInABodyThatIsNotAnObject) {
 }
 
 TYPED_TEST(IdTokenClaims, AreAcceptedUntilTheSecondOfTheirExpiryIsOver) {
-  const std::string behind = CheckBehindExpiry<TypeParam>();
+  const std::string behind = checkBehindExpiry<TypeParam>();
   for (const std::time_t expiry :
        {std::time_t{1}, std::time_t{1300819380}, std::time_t{4102444800}}) {
     for (const std::string& exp : {std::to_string(expiry), "\"" + std::to_string(expiry) + "\"",
@@ -113,7 +113,7 @@ TYPED_TEST(IdTokenClaims, AreAcceptedUntilTheSecondOfTheirExpiryIsOver) {
       for (const auto& [now, message] : std::vector<std::pair<std::time_t, std::string>>{
                {expiry - 1, behind}, {expiry, behind}, {expiry + 1, kExpired}}) {
         const test::Clock clock(now);
-        EXPECT_EQ(this->MessageForExpiry(exp), message) << exp << " at " << now;
+        EXPECT_EQ(this->messageForExpiry(exp), message) << exp << " at " << now;
       }
     }
   }
@@ -121,7 +121,7 @@ TYPED_TEST(IdTokenClaims, AreAcceptedUntilTheSecondOfTheirExpiryIsOver) {
 
 // Each form is read as a text by a stream, which takes the number that it begins with.
 TYPED_TEST(IdTokenClaims, HaveAnExpiryInAnyFormThatBeginsWithANumber) {
-  const std::string behind = CheckBehindExpiry<TypeParam>();
+  const std::string behind = checkBehindExpiry<TypeParam>();
   const std::vector<std::pair<std::string, std::string>> cases = {
       {"4102444800", behind},
       {"\"4102444800\"", behind},
@@ -151,19 +151,19 @@ TYPED_TEST(IdTokenClaims, HaveAnExpiryInAnyFormThatBeginsWithANumber) {
       {"\"\"", kExpired},
       {"\"never\"", kExpired},
       {"\"e4102444800\"", kExpired}};
-  for (const auto& [exp, message] : cases) EXPECT_EQ(this->MessageForExpiry(exp), message) << exp;
+  for (const auto& [exp, message] : cases) EXPECT_EQ(this->messageForExpiry(exp), message) << exp;
 }
 
 TYPED_TEST(IdTokenClaims, WithoutANumberExpireWithTheFirstSecond) {
-  const std::string behind = CheckBehindExpiry<TypeParam>();
+  const std::string behind = checkBehindExpiry<TypeParam>();
   for (const char* exp : {"0", "\"never\"", "\"\"", "null", "false"}) {
     {
       const test::Clock clock(0);
-      EXPECT_EQ(this->MessageForExpiry(exp), behind) << exp;
-      EXPECT_EQ(this->MessageForExpiry("-1"), kExpired);
+      EXPECT_EQ(this->messageForExpiry(exp), behind) << exp;
+      EXPECT_EQ(this->messageForExpiry("-1"), kExpired);
     }
     const test::Clock clock(1);
-    EXPECT_EQ(this->MessageForExpiry(exp), kExpired) << exp;
+    EXPECT_EQ(this->messageForExpiry(exp), kExpired) << exp;
   }
 }
 

@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "support/clients.h"
+#include "support/both_clients.h"
 #include "support/log.h"
 #include "support/throws.h"
 
@@ -22,7 +22,7 @@ class TokenResponse : public testing::Test {
  protected:
   // A token from an earlier response must not survive a response without one.
   template <typename Error>
-  void ExpectRefused(const std::string& response, const std::string& message) {
+  void expectRefused(const std::string& response, const std::string& message) {
     SCOPED_TRACE(testing::PrintToString(response.substr(0, 100)));
     client.ProcessTokenResponse(R"({"id_token":"earlier"})");
     EXPECT_EQ(client.GetToken(), "earlier");
@@ -68,7 +68,7 @@ TYPED_TEST(TokenResponse, ThatIsNotJsonIsRefused) {
       std::string(2000, '['),
       "{\"id_token\":\"a.b.c\",\"x\":" + std::string(1001, '[') + std::string(1001, ']') + "}"};
   for (const std::string& text : texts)
-    this->template ExpectRefused<std::invalid_argument>(text, "parse json falied");
+    this->template expectRefused<std::invalid_argument>(text, "parse json falied");
 }
 
 TYPED_TEST(TokenResponse, WithoutAnIdTokenIsRefused) {
@@ -76,7 +76,7 @@ TYPED_TEST(TokenResponse, WithoutAnIdTokenIsRefused) {
        {"{}", R"({"id_token":null})", R"({"id_token":5})", R"({"id_token":true})",
         R"({"id_token":["a.b.c"]})", R"({"id_token":{"a":"b"}})", R"({"ID_TOKEN":"a.b.c"})",
         R"({"access_token":"a.b.c"})", R"({"x":{"id_token":"a.b.c"}})"})
-    this->template ExpectRefused<sso_err_resp>(text, kNoToken);
+    this->template expectRefused<sso_err_resp>(text, kNoToken);
 }
 
 // "502 Bad Gateway" is the number 502 to the JSON reader.
@@ -84,7 +84,7 @@ TYPED_TEST(TokenResponse, ThatIsNotAnObjectHasNoIdToken) {
   for (const char* text :
        {"502 Bad Gateway", "502", "null", "true", "\"id_token\"", "[]", R"(["id_token","a.b.c"])",
         R"([{"id_token":"a.b.c"}])", R"(["error"])", "\"error\""})
-    this->template ExpectRefused<sso_err_resp>(text, kNoToken);
+    this->template expectRefused<sso_err_resp>(text, kNoToken);
 }
 
 TYPED_TEST(TokenResponse, MayHoldComments) {
@@ -122,13 +122,13 @@ TEST_F(AzureErrorResponse, IsTheMessage) {
       {R"({"error":{"code":"x"}})", "{\"error\":{\"code\":\"x\"}}\n"},
       {R"({"id_token":"a.b.c", "error":""})", "{\"error\":\"\",\"id_token\":\"a.b.c\"}\n"}};
   for (const ErrorResponse& error : cases)
-    ExpectRefused<sso_err_resp>(error.response, error.message);
+    expectRefused<sso_err_resp>(error.response, error.message);
 }
 
 using WebSphereErrorResponse = TokenResponse<test::WebSphere>;
 
 TEST_F(WebSphereErrorResponse, IsNotLookedInto) {
-  ExpectRefused<sso_err_resp>(R"({"error":"invalid_grant", "error_description":"expired"})",
+  expectRefused<sso_err_resp>(R"({"error":"invalid_grant", "error_description":"expired"})",
                               kNoToken);
 }
 

@@ -5,7 +5,7 @@
 
 #include <string>
 
-#include "support/clients.h"
+#include "support/both_clients.h"
 #include "support/device.h"
 #include "support/log.h"
 #include "support/memory_spy.h"

@@ -1,4 +1,4 @@
-#include "support/unnamed_file.h"
+#include "support/memory_file.h"
 
 #include <sys/mman.h>
 #include <unistd.h>
@@ -15,15 +15,15 @@ void require(bool good, const char* what) {
 
 }  // namespace
 
-UnnamedFile::UnnamedFile() : file(memfd_create("test", MFD_CLOEXEC)) {
+MemoryFile::MemoryFile() : file(memfd_create("test", MFD_CLOEXEC)) {
   require(file >= 0, "memfd_create");
 }
 
-UnnamedFile::~UnnamedFile() {
+MemoryFile::~MemoryFile() {
   close(file);
 }
 
-void UnnamedFile::put(const std::string& text) const {
+void MemoryFile::put(const std::string& text) const {
   for (std::size_t done = 0; done < text.size();) {
     const ssize_t n = write(file, text.data() + done, text.size() - done);
     require(n > 0, "write");
@@ -31,7 +31,7 @@ void UnnamedFile::put(const std::string& text) const {
   }
 }
 
-std::string UnnamedFile::contents() const {
+std::string MemoryFile::contents() const {
   std::string text;
   char piece[65536];
   for (ssize_t n; (n = pread(file, piece, sizeof piece, static_cast<off_t>(text.size()))) > 0;) {
@@ -40,11 +40,11 @@ std::string UnnamedFile::contents() const {
   return text;
 }
 
-void UnnamedFile::putPart(const std::string& part) const {
+void MemoryFile::putPart(const std::string& part) const {
   put(std::to_string(part.size()) + "\n" + part);
 }
 
-std::vector<std::string> UnnamedFile::parts() const {
+std::vector<std::string> MemoryFile::parts() const {
   const std::string text = contents();
   std::vector<std::string> parts;
   for (std::size_t at = 0; at < text.size();) {

@@ -13,7 +13,7 @@
 #include <type_traits>
 #include <vector>
 
-#include "support/clients.h"
+#include "support/both_clients.h"
 #include "support/device.h"
 #include "support/faults.h"
 #include "support/log.h"
@@ -39,17 +39,17 @@ class ClientConfig : public testing::Test {
  protected:
   using Client = typename Provider::Client;
 
-  static std::string File() { return Provider::name() + ".conf"; }
+  static std::string file() { return Provider::name() + ".conf"; }
   static std::vector<Setting> Settings() { return test::settingsOf(Provider::name()); }
 
   // A file in which every setting is its own key.
-  static Json::Value Everything() {
+  static Json::Value everything() {
     Json::Value file(Json::objectValue);
     for (const Setting& setting : Settings()) file[setting.key] = setting.key;
     return file;
   }
 
-  static void ExpectEmpty(Client& client) {
+  static void expectEmpty(Client& client) {
     EXPECT_FALSE(client.isEnable());
     for (const Setting& setting : Settings()) EXPECT_EQ((client.*setting.get)(), "") << setting.key;
     EXPECT_EQ(client.GetToken(), "");
@@ -57,7 +57,7 @@ class ClientConfig : public testing::Test {
 
   void TearDown() override {
     EXPECT_TRUE(log.isEmpty());
-    std::remove(test::configPath(File()).c_str());
+    std::remove(test::configPath(file()).c_str());
   }
 
   test::Log log;
@@ -65,7 +65,7 @@ class ClientConfig : public testing::Test {
 TYPED_TEST_SUITE(ClientConfig, test::Clients, test::ClientName);
 
 TYPED_TEST(ClientConfig, TakesEverySettingFromItsKey) {
-  writeConfig(this->File(), this->Everything().toStyledString());
+  writeConfig(this->file(), this->everything().toStyledString());
   typename TypeParam::Client client;
   for (const Setting& setting : this->Settings())
     EXPECT_EQ((client.*setting.get)(), setting.key) << setting.key;
@@ -73,7 +73,7 @@ TYPED_TEST(ClientConfig, TakesEverySettingFromItsKey) {
 }
 
 TYPED_TEST(ClientConfig, IsReadOnAfterAnInterruption) {
-  writeConfig(this->File(), this->Everything().toStyledString());
+  writeConfig(this->file(), this->everything().toStyledString());
   const test::Fault interruption("read");
   typename TypeParam::Client client;
   EXPECT_TRUE(interruption.wasHit());
@@ -90,7 +90,7 @@ int nextDescriptor() {
 
 TYPED_TEST(ClientConfig, LeavesNoFileOpen) {
   const int before = nextDescriptor();
-  writeConfig(this->File(), "{}");
+  writeConfig(this->file(), "{}");
   typename TypeParam::Client client;
   EXPECT_GE(before, 0);
   EXPECT_EQ(nextDescriptor(), before);
@@ -98,7 +98,7 @@ TYPED_TEST(ClientConfig, LeavesNoFileOpen) {
 
 TYPED_TEST(ClientConfig, WithoutAFileIsEmpty) {
   typename TypeParam::Client client;
-  this->ExpectEmpty(client);
+  this->expectEmpty(client);
 }
 
 TYPED_TEST(ClientConfig, IsEmptyForAFileThatIsNotAnObject) {
@@ -109,16 +109,16 @@ TYPED_TEST(ClientConfig, IsEmptyForAFileThatIsNotAnObject) {
   texts.push_back("{\"" + TypeParam::name() + "_client_id\":\"x\",");
   for (const std::string& text : texts) {
     SCOPED_TRACE(testing::PrintToString(text.substr(0, 40)));
-    writeConfig(this->File(), text);
+    writeConfig(this->file(), text);
     typename TypeParam::Client client;
-    this->ExpectEmpty(client);
+    this->expectEmpty(client);
   }
 }
 
 TYPED_TEST(ClientConfig, IsEmptyForADirectory) {
-  ASSERT_EQ(mkdir(test::configPath(this->File()).c_str(), 0700), 0);
+  ASSERT_EQ(mkdir(test::configPath(this->file()).c_str(), 0700), 0);
   typename TypeParam::Client client;
-  this->ExpectEmpty(client);
+  this->expectEmpty(client);
 }
 
 TYPED_TEST(ClientConfig, IgnoresASettingOfAnotherType) {
@@ -128,9 +128,9 @@ TYPED_TEST(ClientConfig, IgnoresASettingOfAnotherType) {
   for (const Setting& odd : this->Settings()) {
     for (const Json::Value& value : wrong) {
       SCOPED_TRACE(odd.key + ": " + value.toStyledString());
-      Json::Value file = this->Everything();
+      Json::Value file = this->everything();
       file[odd.key] = value;
-      writeConfig(this->File(), file.toStyledString());
+      writeConfig(this->file(), file.toStyledString());
       typename TypeParam::Client client;
       for (const Setting& setting : this->Settings())
         EXPECT_EQ((client.*setting.get)(), setting.key == odd.key ? "" : setting.key);
@@ -143,7 +143,7 @@ TYPED_TEST(ClientConfig, LeavesOutWhatIsMissing) {
     SCOPED_TRACE(only.key);
     Json::Value file(Json::objectValue);
     file[only.key] = "x";
-    writeConfig(this->File(), file.toStyledString());
+    writeConfig(this->file(), file.toStyledString());
     typename TypeParam::Client client;
     for (const Setting& setting : this->Settings())
       EXPECT_EQ((client.*setting.get)(), setting.key == only.key ? "x" : "");
@@ -157,36 +157,36 @@ TYPED_TEST(ClientConfig, TakesValuesAsTheyAre) {
     SCOPED_TRACE(testing::PrintToString(value.substr(0, 40)));
     Json::Value file(Json::objectValue);
     for (const Setting& setting : this->Settings()) file[setting.key] = value;
-    writeConfig(this->File(), file.toStyledString());
+    writeConfig(this->file(), file.toStyledString());
     typename TypeParam::Client client;
     for (const Setting& setting : this->Settings()) EXPECT_EQ((client.*setting.get)(), value);
   }
 }
 
 TYPED_TEST(ClientConfig, IgnoresKeysThatAreNotItsOwn) {
-  writeConfig(this->File(), R"({"azure_":"x", "websphere_":"x", "client_id":"x", "CLIENT_ID":"x",
+  writeConfig(this->file(), R"({"azure_":"x", "websphere_":"x", "client_id":"x", "CLIENT_ID":"x",
       "sso_profile":"x", "code":"x", "token":"x", "id_token":"x",)"
                             R"("Azure_client_id":"x", "WebSphere_client_id":"x"})");
   typename TypeParam::Client client;
-  this->ExpectEmpty(client);
+  this->expectEmpty(client);
 }
 
 TYPED_TEST(ClientConfig, IsReadWithTheSettingsOfThatMoment) {
-  writeConfig(this->File(), this->Everything().toStyledString());
+  writeConfig(this->file(), this->everything().toStyledString());
   typename TypeParam::Client client;
-  writeConfig(this->File(), "{}");
+  writeConfig(this->file(), "{}");
   EXPECT_EQ(client.GetClientID(), TypeParam::name() + "_client_id");
 }
 
 TYPED_TEST(ClientConfig, AnswersWithCopies) {
-  writeConfig(this->File(), this->Everything().toStyledString());
+  writeConfig(this->file(), this->everything().toStyledString());
   typename TypeParam::Client client;
   client.GetClientID() += "changed";
   EXPECT_EQ(client.GetClientID(), TypeParam::name() + "_client_id");
 }
 
 TYPED_TEST(ClientConfig, IsReadAsRootAndTheIdentityPutBack) {
-  writeConfig(this->File(), this->Everything().toStyledString(), 0600);
+  writeConfig(this->file(), this->everything().toStyledString(), 0600);
   const test::Ids cgi = {1000, 1001, 0};
   const std::string unit = TypeParam::unit();
   test::asProcess(cgi, [&] {
@@ -202,12 +202,12 @@ TYPED_TEST(ClientConfig, IsReadAsRootAndTheIdentityPutBack) {
 }
 
 TYPED_TEST(ClientConfig, StaysEmptyWithoutTheRightToReadIt) {
-  writeConfig(this->File(), this->Everything().toStyledString(), 0600);
+  writeConfig(this->file(), this->everything().toStyledString(), 0600);
   const std::string unit = TypeParam::unit();
   test::asProcess({1000, 1000, 1000}, [&] {
     test::Log child_log;
     typename TypeParam::Client client;
-    this->ExpectEmpty(client);
+    this->expectEmpty(client);
     EXPECT_TRUE(child_log.is(
         {{LOG_AUTH | LOG_ERR, unit, "ERROR: setresgid(-1, 0, -1) [Operation not permitted]"},
          {LOG_AUTH | LOG_ERR, unit, "ERROR: ENTERCriticalSection"}}));
@@ -254,7 +254,7 @@ TYPED_TEST(ClientConfig, IsDestroyedThroughItsOwnType) {
   EXPECT_TRUE((std::is_base_of_v<QOVA::SSO::SSOClient, Own>));
   EXPECT_TRUE(std::has_virtual_destructor_v<Own>);
   EXPECT_FALSE(std::has_virtual_destructor_v<QOVA::SSO::SSOClient>);
-  writeConfig(this->File(), this->Everything().toStyledString());
+  writeConfig(this->file(), this->everything().toStyledString());
   std::make_unique<Own>().reset();
 }
 

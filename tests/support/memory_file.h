@@ -6,12 +6,12 @@
 
 namespace test {
 
-class UnnamedFile {
+class MemoryFile {
  public:
-  UnnamedFile();
-  ~UnnamedFile();
-  UnnamedFile(const UnnamedFile&) = delete;
-  UnnamedFile& operator=(const UnnamedFile&) = delete;
+  MemoryFile();
+  ~MemoryFile();
+  MemoryFile(const MemoryFile&) = delete;
+  MemoryFile& operator=(const MemoryFile&) = delete;
 
   int descriptor() const { return file; }
   void put(const std::string& text) const;

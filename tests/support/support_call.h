@@ -4,14 +4,14 @@
 
 namespace test {
 
-inline int busy = 0;
+inline int support_calls = 0;
 
-class Busy {
+class SupportCall {
  public:
-  Busy() { ++busy; }
-  ~Busy() { --busy; }
-  Busy(const Busy&) = delete;
-  Busy& operator=(const Busy&) = delete;
+  SupportCall() { ++support_calls; }
+  ~SupportCall() { --support_calls; }
+  SupportCall(const SupportCall&) = delete;
+  SupportCall& operator=(const SupportCall&) = delete;
 };
 
 }  // namespace test
