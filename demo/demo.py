@@ -19,22 +19,31 @@ from providers.liberty import Liberty
 from scene import DEVICE, PROVIDER, Scene, StepError, say, show_logs
 from stage import WWW, Stage, StageError
 
+NEXT = """
+  scripts/demo --serve                  the same in your own browser, with every step explained
+  scripts/demo --serve --login PROGRAM  with your own login program
+  docs/integrating.md                   what a login program must do; device/ is one to copy from
+  ssoclient-doctor                      on a device: finds out why a sign-in fails"""
+
 PROVIDERS = {"glewlwyd": Glewlwyd, "lemonldap": LemonLDAP, "entra": Entra, "liberty": Liberty}
 
 
-def serve(scene, narrator, profile, sockets):
+def serve(scene, narrator, profile, login, sockets):
     titles = [title for title, setup in scene.provider.setups.items() if setup[0] == profile]
     if not titles:
         raise StageError(f"{scene.provider.title} has no sign-in for the profile {profile}")
     scene.choose(titles[-1])
     forward.start(sockets)
     person = scene.person
+    own = """Your login program is /webman/login.cgi there. The device's front page knows the sessions of the
+reference login program alone: with yours it goes on saying that you are not signed in.
+""" if login else ""
     print(f"""
 The demo is running; sign-in "{titles[-1]}".
   Open        {scene.stage.device}/
   Name        {scene.provider.login_name}
   Password    {person.password}
-Both servers' certificates come from an authority made for this run: your browser will warn,
+{own}Both servers' certificates come from an authority made for this run: your browser will warn,
 once for the device and once for the provider ({scene.provider.url}/).
 Browsers find names below ".localhost" by themselves. If yours does not, add to the hosts file
 of the machine where it runs:
@@ -63,8 +72,10 @@ def visits(scene, pictures):
             done.append(visit.outcome())
         if pictures:
             Pictures(scene, chromium, pictures).take()
-    say("all sign-ins succeeded:")
-    print("\n".join("  " + line for line in done), flush=True)
+    print(f"""
+What happened, in Chromium, on a device and at a provider that exist in this run alone:
+{chr(10).join("  " + line for line in done)}
+Next:{NEXT}""", flush=True)
 
 
 def read_options():
@@ -95,7 +106,7 @@ def main():
         if options.login:
             stage.install_login(options.login, WWW + "/webman/login.cgi", 0o4750)
         if options.serve:
-            serve(scene, narrator, options.serve, options.sockets)
+            serve(scene, narrator, options.serve, options.login, options.sockets)
         else:
             visits(scene, options.screenshots)
         return 0
