@@ -48,19 +48,17 @@ Ctrl-C ends it.
 
 
 def visits(scene, pictures):
-    """Signs in and out with each client, on each road; each step says what was seen."""
+    """Signs in and out with each client; each step says what was seen."""
     from chromium import Chromium  # not needed, and not there, where somebody else's browser serves
     from visit import Pictures, Visit
     say("browser: Chromium, without a window")
     done = []
     with contextlib.closing(Chromium(scene.stage)) as chromium:
-        for road in ("plain", "checked"):
-            scene.use_road(road)
-            for title in scene.provider.setups:
-                scene.choose(title)
-                visit = Visit(scene, chromium, title, road)
-                visit.run()
-                done.append(visit.outcome())
+        for title in scene.provider.setups:
+            scene.choose(title)
+            visit = Visit(scene, chromium, title)
+            visit.run()
+            done.append(visit.outcome())
         if pictures:
             Pictures(scene, chromium, pictures).take()
     say("all sign-ins succeeded:")

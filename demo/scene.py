@@ -79,7 +79,8 @@ class Scene:
         self.stage.build()
         say(f"device: library, login program (set-id root), web server on {self.stage.device}")
         self.stage.install(prefix, programs, pages)
-        self.use_road("checked")
+        self.server = Lighttpd(self.stage)
+        self.server.start({})
         say(f"provider: {self.provider.title} on {self.provider.url}")
         self.provider.start()
         self._clients()
@@ -106,13 +107,6 @@ class Scene:
     def expected(self, title):
         """The name under which the user is then signed in on the device."""
         return self.users[self.provider.setups[title][0]]
-
-    def use_road(self, road, **environment):
-        """Plain: the login program calls OIDCLogin. Checked: it also compares the nonce."""
-        if self.server is not None:
-            self.server.stop()
-        self.server = Lighttpd(self.stage)
-        self.server.start({"SSO_LOGIN_ROAD": road, **environment})
 
 
 def show_logs(stage):

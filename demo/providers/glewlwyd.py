@@ -71,7 +71,7 @@ class Glewlwyd:
     fields = "#username", "#password"  # of the login page
     comes_back = False  # after a logout
     goodbye = "Session closed"
-    why_not_back = "it returns only to a client that sends an ID token, which the device does not"
+    why_not_back = "it closes the session and does not redirect"
     setups = BOTH
 
     def __init__(self, stage, person):

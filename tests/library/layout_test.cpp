@@ -24,23 +24,23 @@ constexpr bool k64 = sizeof(void*) == 8;
 
 // Sizes in bytes; the alignment is a pointer's for all of them.
 template <typename T>
-constexpr bool Is(std::size_t on64, std::size_t on32) {
+constexpr bool hasSize(std::size_t on64, std::size_t on32) {
   return sizeof(T) == (k64 ? on64 : on32) && alignof(T) == alignof(void*);
 }
 
-static_assert(Is<std::string>(32, 24), "another string class gives another interface");
-static_assert(Is<SSOClient>(304, 224));
-static_assert(Is<AzureSSOClient>(336, 248));
-static_assert(Is<WebSphereSSOClient>(304, 224));
-static_assert(Is<SSOProfile>(352, 256));
-static_assert(Is<Jwt>(96, 72));
-static_assert(Is<sso_exception>(16, 8));
-static_assert(Is<sso_err_resp>(16, 8));
-static_assert(Is<sso_op_failed>(16, 8));
-static_assert(Is<sso_not_implemented>(16, 8));
-static_assert(Is<jwt_exception>(16, 8));
-static_assert(Is<jwt_not_support>(16, 8));
-static_assert(Is<jwt_verify_failed>(16, 8));
+static_assert(hasSize<std::string>(32, 24), "another string class gives another interface");
+static_assert(hasSize<SSOClient>(304, 224));
+static_assert(hasSize<AzureSSOClient>(336, 248));
+static_assert(hasSize<WebSphereSSOClient>(304, 224));
+static_assert(hasSize<SSOProfile>(352, 256));
+static_assert(hasSize<Jwt>(96, 72));
+static_assert(hasSize<sso_exception>(16, 8));
+static_assert(hasSize<sso_err_resp>(16, 8));
+static_assert(hasSize<sso_op_failed>(16, 8));
+static_assert(hasSize<sso_not_implemented>(16, 8));
+static_assert(hasSize<jwt_exception>(16, 8));
+static_assert(hasSize<jwt_not_support>(16, 8));
+static_assert(hasSize<jwt_verify_failed>(16, 8));
 
 // The destructor entry that the base does not have and its children do.
 static_assert(std::is_polymorphic_v<SSOClient> && !std::has_virtual_destructor_v<SSOClient>);
@@ -75,7 +75,7 @@ class Fields : public SSOClient {
 
 // The one base class that the library's own type information names.
 template <typename T>
-const std::type_info* BaseOf() {
+const std::type_info* baseOf() {
   const auto* single = dynamic_cast<const abi::__si_class_type_info*>(&typeid(T));
   return single == nullptr ? nullptr : single->__base_type;
 }
@@ -83,8 +83,8 @@ const std::type_info* BaseOf() {
 template <typename T, typename Base>
 void expectBase() {
   static_assert(std::is_base_of_v<Base, T>);
-  ASSERT_NE(BaseOf<T>(), nullptr) << typeid(T).name();
-  EXPECT_TRUE(*BaseOf<T>() == typeid(Base)) << typeid(T).name();
+  ASSERT_NE(baseOf<T>(), nullptr) << typeid(T).name();
+  EXPECT_TRUE(*baseOf<T>() == typeid(Base)) << typeid(T).name();
 }
 
 template <typename T>
