@@ -104,6 +104,21 @@ def launcher_alone(place):
     place.stage.install_login(build + "/demo/device/launcher.cgi", LOGIN, 0o4750)
 
 
+def no_store(place):
+    os.rename("/run/ssoclient", "/run/ssoclient.away")
+    place.later(lambda: os.rename("/run/ssoclient.away", "/run/ssoclient"))
+
+
+def store_of_root(place):
+    os.chown("/run/ssoclient", 0, 0)
+    place.later(lambda: os.chown("/run/ssoclient", 33, 33))
+
+
+def writable_parent(place):
+    os.chown(WWW + "/webman", 33, 33)
+    place.later(lambda: os.chown(WWW + "/webman", 0, 0))
+
+
 # -- tokens and names ----------------------------------------------------------------------
 
 
@@ -121,7 +136,7 @@ def with_claims(**claims):
         entra = place.twin
         key = entra._signing_keys()[0]
         now = int(time.time())
-        value = {"aud": CLIENT, "tid": TENANT, "exp": now + 3600, "iss": entra.url,
+        value = {"aud": CLIENT, "tid": TENANT, "exp": now + 3600, "iss": f"https://sts.windows.net/{TENANT}/",
                  "unique_name": "alice@ad.example.net", **claims}
         value = {name: one for name, one in value.items() if one is not None}
         header = {"alg": "RS256", "kid": key.thumbprint}
@@ -205,11 +220,34 @@ PROGRAM = [
           ("writ|replace|change",), at=("login.cgi",), do=("chmod",), grade=EITHER),
     Fault("library folder is the web server's", writable_library, FINE,
           ("librar|folder|writ",), at=("/usr/qova/lib",), do=("chown|chmod",), grade=EITHER),
-    Fault("launcher without its target", launcher_alone, FINE, ("launcher|target|start|ssoclient-login|librar|answer|login program",),
-          at=("login.cgi|ssoclient-login",), grade=EITHER),
+    Fault("launcher without its target", launcher_alone, "success=false", ("launcher|target|start|ssoclient-login|librar|answer|login program",),
+          at=("login.cgi|ssoclient-login",), program=True),
+]
+
+STORE = [
+    Fault("store folder is missing", no_store, "success=false", ("store|/run/ssoclient|folder",),
+          at=("/run/ssoclient|login.cgi",), program=True),
+    Fault("store folder is root's", store_of_root, "success=false",
+          ("store|/run/ssoclient|folder|login program",), at=("/run/ssoclient|login.cgi",),
+          program=True),
+    Fault("program's folder is the web server's", writable_parent, FINE,
+          ("folder|replace|writ|directory",), at=("webman",), do=("chown|chmod",), grade=EITHER),
 ]
 
 TOKENS = [
+    Fault("token response instead of the token", all_of(pasted(lambda given: json.dumps(
+        {"token_type": "Bearer", "access_token": "opaque", "id_token": given}))), FINE,
+          ("json|response|id_token|segment|form|three",), do=("id_token|id token|token",)),
+    Fault("access token of another resource", with_claims(
+        aud="00000003-0000-0000-c000-000000000000"), FINE, ("aud|client|audience",),
+          do=("id token|client|access|azure_client_id",)),
+    Fault("expired only by the device's clock", all_of(
+        twin(clock_skew=-7200), pasted()), "id_token expired", ("expired|clock",),
+          do=("clock|time",), more=1),
+    Fault("name with two at signs", with_claims(unique_name="alice@ad@example.net"), FINE,
+          ("@|name",)),
+    Fault("token without any name", with_claims(unique_name=None), FINE,
+          ("name|unique_name|email",), do=("email|unique_name|v1",)),
     Fault("v2.0 token without email",
           all_of(twin(email_claim=False), pasted(v2=True)), "cannot find the user name",
           ("unique_name|email|name",), do=("email|optional|v1",), base="v2"),
@@ -294,6 +332,17 @@ EXPLAINED = [
      "kid does not exist in Azure verified kyes", "appid|key"),
     ("no name in the token", "v2", explained(email_claim=False), "cannot find the user name!",
      "email|optional claim"),
+    ("consent declined, from the browser's address", "v1", message(
+        "https://device.example.net/webman/login.cgi?error=access_denied&error_description="
+        "AADSTS65004%3a+User+declined+to+consent&error_uri=https%3a%2f%2flogin.example.net"),
+     "AADSTS65004", "consent|declin"),
+    ("source of an error page", "v1", message(
+        "$Config={&quot;strServiceExceptionMessage&quot;:&quot;AADSTS50020: User account "
+        "&#39;bob@other.example.org&#39; from identity provider does not exist in tenant"),
+     "AADSTS50020", "guest|tenant|account|directory"),
+    ("code in lower case among other words", "v1", message(
+        "nov 22 device: sign-in failed: aadsts7000218: the request body must contain"),
+     "aadsts7000218", "secret"),
     ("Liberty: client unknown", "liberty", explained(client_id="other"), "CWOAU0061E", "client"),
     ("Liberty: redirect URI", "liberty", explained(redirect_uris=[RELAY]), "CWOAU0062E", "redirect"),
     ("Liberty: short secret, from its log", "liberty", from_the_log(algorithm="HS512"),
@@ -304,4 +353,4 @@ EXPLAINED = [
      "code|expire|clock|again"),
 ]
 
-FAULTS = PROGRAM + TOKENS + LIBERTY
+FAULTS = PROGRAM + STORE + TOKENS + LIBERTY

@@ -230,7 +230,7 @@ organizationName=optional
         texts."""
         self._seconds = seconds
         url = self._helper("url")
-        if not url.startswith(self.twin.url + "/"):
+        if not self._at_the_twin(url):
             return f"the browser is sent to {url}"
         back = self._at_the_provider(url)
         if not back.startswith(CALLBACK + "?"):
@@ -239,6 +239,14 @@ organizationName=optional
         if "code" not in values:
             return "came back with " + back.split("?", 1)[1]
         return self._helper("user", values["code"])
+
+    def _at_the_twin(self, url):
+        try:
+            parts, twin = urllib.parse.urlsplit(url), urllib.parse.urlsplit(self.twin.url)
+            return (parts.scheme, parts.hostname, parts.port or 443) == (
+                twin.scheme, twin.hostname, twin.port or 443)
+        except ValueError:  # no URL at all
+            return False
 
     def _helper(self, *arguments, program=HELPER):
         begin = len(self.stage.log.lines)
@@ -277,7 +285,7 @@ organizationName=optional
         answer = self._ask("GET", url)
         for _ in range(6):
             target = answer.headers.get("Location")
-            if target is not None and not target.startswith(self.twin.url + "/"):
+            if target is not None and not self._at_the_twin(target):
                 return target
             if target is not None:
                 answer = self._ask("GET", target)

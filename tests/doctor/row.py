@@ -24,6 +24,7 @@ class Fault:
     run: tuple = ()
     never: tuple = ()
     more: int = 0
+    program: bool = False  # the login program itself answers instead of the sign-in
 
 
 def all_of(*steps):
