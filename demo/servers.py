@@ -39,7 +39,7 @@ class Server:
         certificate, key = self.stage.device_certificate
         path = f"{FOLDER}/{self.processes[0]}.conf"
         write(path, text.format(
-            port=self.stage.device_port, user=WEB_USER, www=WWW, folder=FOLDER,
+            port=self.stage.device_listens, user=WEB_USER, www=WWW, folder=FOLDER,
             certificate=certificate, key=key,
             log=self.stage.log_file(self.processes[0], WEB_USER), **values))
         return path
@@ -73,7 +73,7 @@ setenv.set-environment = ({environment})
             return ", ".join(f'"{name}" => "{value}"' for name, value in values.items())
         path = self._write(self.CONFIG, headers=pairs(HEADERS), environment=pairs(environment))
         self.stage.spawn("lighttpd", ["lighttpd", "-D", "-f", path])
-        self.stage.wait_for("lighttpd", self.stage.device_port)
+        self.stage.wait_for("lighttpd", self.stage.device_listens)
 
 
 class Apache(Server):

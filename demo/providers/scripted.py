@@ -68,7 +68,7 @@ class Scripted(Site):
     # -- set-up ----------------------------------------------------------------------------
 
     def start(self):
-        self.listen(self._stage.provider_port,
+        self.listen(self._stage.provider_listens,
                     self._stage.certificate(self._stage.provider_name))
 
     def stop(self, but=None):
