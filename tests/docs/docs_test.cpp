@@ -1,5 +1,5 @@
-// The documents against the sources: no text, key, finding or option is missing in them, and none
-// stands there that is gone.
+// The documents against the sources: no text, key, finding or option is missing in them, and
+// nothing in them is obsolete.
 #include <gtest/gtest.h>
 
 #include <cctype>
