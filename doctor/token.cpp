@@ -233,8 +233,6 @@ class TokenCheck {
          reply.said);
   }
 
-  // --- user name
-
   void CheckName() {
     const Reply reply = checkup.library.UserName(token);
     const char* const claim = azure ? "unique_name, email" : "sub";
