@@ -54,6 +54,8 @@ struct Checkup {
 
   // The URL that the discovery document has in place of a configured one; empty: none or the same.
   std::string Documented(const std::string& name, const std::string& configured) const;
+  // What to do about a URL of an endpoint that leads nowhere: the action of a finding.
+  std::string Fix(const std::string& name, const std::string& configured) const;
 
   struct ServerTime {
     std::string server;

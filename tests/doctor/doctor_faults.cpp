@@ -734,8 +734,6 @@ std::vector<SeededFault> azureTokenFaults() {
        1, Proof::kSameWords},
       {"TokenRefused", claim("aud", "someone else"), "token-refused", "failure",
        "client ID invalid", "checks above", 1, Proof::kSameWords},
-      {"TokenOfAnotherIssuer", claim("iss", "https://elsewhere.example.net"), "token-other-issuer",
-       "warning", "", "belong together", 0, Proof::kSucceeds},
       {"TokenWithoutSettings", token([](Site& s) {
          s.user = {1000, 1000, 1000};
        }),
