@@ -23,7 +23,7 @@ namespace {
 
 constexpr int kFirstDeadline = 30;         // until the settings are read
 constexpr rlim_t kChildMemory = 64 << 20;  // beyond what it has when it starts
-#ifdef __SANITIZE_ADDRESS__  // whose shadow takes terabytes
+#ifdef __SANITIZE_ADDRESS__                // whose shadow takes terabytes
 constexpr bool kLimitMemory = false;
 #else
 constexpr bool kLimitMemory = true;
