@@ -29,7 +29,7 @@ File Load(const FileKind& kind);
 // is then in `document`. `in_use`: a sign-in needs the file.
 bool CheckFile(Checkup& checkup, const File& file, bool in_use, Json::Value& document);
 
-// "0644"
-std::string Mode(const struct stat& status);
+// keys_check.cpp: the keys of the file, and what is wrong with their values in themselves.
+void CheckKeys(Checkup& checkup, const File& file, bool in_use, const Json::Value& document);
 
 }  // namespace doctor

@@ -37,5 +37,6 @@ inline std::ostream& operator<<(std::ostream& out, const SeededFault& fault) {
 }
 
 std::vector<SeededFault> allFaults();
+std::vector<SeededFault> localFaults();  // those of local_faults.cpp, which are among them
 
 }  // namespace test
