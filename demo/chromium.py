@@ -19,21 +19,30 @@ from stage import StageError, run
 PATIENCE = 30  # seconds until a page that does not come is given up
 
 # The first line: root needs it, and the namespace is the sandbox here. The second: a small machine
-# without a screen. The last: fewer processes. The rest: no word to anybody but the pages.
+# without a screen. The last three: fewer processes, and no limit to how often an address
+# changes. The rest: no word to anybody but the pages.
 FLAGS = ("--no-sandbox",
          "--headless", "--disable-gpu", "--disable-dev-shm-usage", "--hide-scrollbars",
          "--disable-quic", "--no-first-run", "--disable-background-networking",
          "--disable-component-update", "--disable-sync", "--disable-default-apps",
          "--disable-extensions", "--no-proxy-server", "--lang=en-US",
-         "--disable-site-isolation-trials", "--renderer-process-limit=1")
+         "--disable-site-isolation-trials", "--renderer-process-limit=1",
+         "--disable-ipc-flooding-protection")
 
-# The relay page goes on by itself: what it showed is kept for who comes to look a moment later.
+# The relay page goes on by itself, and so does the one that is shown during the exchange: what they
+# showed, and for how long, is kept for who comes to look a moment later.
 KEEP = """
-if (location.pathname.endsWith("/relay.html")) {
+const name = /[/](relay|login)[.](html|cgi)$/.exec(location.pathname)?.[1];
+if (name) {
+  const kept = JSON.parse(sessionStorage.getItem(name) || "[]");
+  const keep = () => sessionStorage.setItem(name, JSON.stringify(kept));
   addEventListener("DOMContentLoaded", () => {
-    const kept = JSON.parse(sessionStorage.getItem("relay") || "[]");
     kept.push({url: location.href, text: document.body.innerText});
-    sessionStorage.setItem("relay", JSON.stringify(kept));
+    keep();
+  });
+  addEventListener("pagehide", () => {
+    kept[kept.length - 1].seconds = performance.now() / 1000;
+    keep();
   });
 }
 """
@@ -130,6 +139,12 @@ class Tab:
         for key in keys:
             self.driver.switch_to.active_element.send_keys(getattr(Keys, key, key))
 
+    def speak(self, languages):
+        """Sets the browser's languages, as Accept-Language lists them, and reloads the page."""
+        agent = self.script("return navigator.userAgent")
+        self.command("Emulation.setUserAgentOverride", userAgent=agent, acceptLanguage=languages)
+        self.driver.refresh()
+
     # -- what a person sees ----------------------------------------------------------------
 
     @property
@@ -173,7 +188,14 @@ class Tab:
 
     def relay(self):
         """What relay pages showed to this person, oldest first: their URLs and texts."""
-        return self.script("return JSON.parse(sessionStorage.getItem('relay') || '[]')")
+        return self._kept("relay")
+
+    def waited(self):
+        """The same of the pages that are shown while the device asks the provider."""
+        return self._kept("login")
+
+    def _kept(self, name):
+        return self.script("return JSON.parse(sessionStorage.getItem(arguments[0]) || '[]')", name)
 
     def complaints(self):
         """What the browser has logged since the last time: scripts that fail, violations of a

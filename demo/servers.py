@@ -14,7 +14,8 @@ import forward
 from stage import FOLDER, WEB_USER, WWW, write
 
 HEADERS = {"X-Content-Type-Options": "nosniff", "X-Frame-Options": "DENY",
-           "Referrer-Policy": "no-referrer"}
+           "Referrer-Policy": "same-origin",  # a form says where it comes from
+           "Content-Security-Policy": "frame-ancestors 'none'"}
 
 
 class Server:
@@ -38,7 +39,7 @@ class Server:
         certificate, key = self.stage.device_certificate
         path = f"{FOLDER}/{self.processes[0]}.conf"
         write(path, text.format(
-            port=self.stage.device_port, user=WEB_USER, www=WWW, folder=FOLDER,
+            port=self.stage.device_listens, user=WEB_USER, www=WWW, folder=FOLDER,
             certificate=certificate, key=key,
             log=self.stage.log_file(self.processes[0], WEB_USER), **values))
         return path
@@ -58,7 +59,7 @@ server.document-root = "{www}"
 server.errorlog = "{log}"
 index-file.names = ("index.cgi")
 mimetype.assign = (".html" => "text/html; charset=utf-8", ".css" => "text/css",
-                   ".js" => "text/javascript")
+                   ".js" => "text/javascript", ".svg" => "image/svg+xml")
 cgi.assign = (".cgi" => "")
 ssl.engine = "enable"
 ssl.pemfile = "{certificate}"
@@ -72,7 +73,7 @@ setenv.set-environment = ({environment})
             return ", ".join(f'"{name}" => "{value}"' for name, value in values.items())
         path = self._write(self.CONFIG, headers=pairs(HEADERS), environment=pairs(environment))
         self.stage.spawn("lighttpd", ["lighttpd", "-D", "-f", path])
-        self.stage.wait_for("lighttpd", self.stage.device_port)
+        self.stage.wait_for("lighttpd", self.stage.device_listens)
 
 
 class Apache(Server):
@@ -93,6 +94,7 @@ TypesConfig /etc/mime.types
 AddType text/css .css
 AddType text/javascript .js
 AddType text/html .html
+AddType image/svg+xml .svg
 DocumentRoot "{www}"
 DirectoryIndex index.cgi
 SSLEngine on
@@ -137,7 +139,7 @@ error_log {log};
 events {{ }}
 http {{
   access_log off;
-  types {{ text/html html; text/css css; text/javascript js; }}
+  types {{ text/html html; text/css css; text/javascript js; image/svg+xml svg; }}
   client_body_temp_path {folder}/nginx-body;
   fastcgi_temp_path {folder}/nginx-fastcgi;
   proxy_temp_path {folder}/nginx-proxy;
@@ -159,6 +161,7 @@ http {{
       fastcgi_param CONTENT_TYPE $content_type;
       fastcgi_param CONTENT_LENGTH $content_length;
       fastcgi_param SERVER_PROTOCOL $server_protocol;
+      fastcgi_param REMOTE_ADDR $remote_addr;
       {environment}
     }}
   }}

@@ -7,20 +7,18 @@ from scene import StepError, say, shown, values_of
 
 
 class SignIn:
-    EXCHANGE = {"plain": "OIDCLogin", "checked": "login with nonce check"}
-
-    def __init__(self, scene, profile, road):
+    def __init__(self, scene, profile):
         self.scene, self.profile = scene, profile
-        self.name = f"{profile}/{road}"
+        self.name = profile
         self.steps = ("device page", "start of the login", "provider's login page",
-                      "name and password", "consent", "code and state",
-                      self.EXCHANGE[road] + ", relay page", "signed in", "sign out")
+                      "name and password", "consent", "code and state", "relay page",
+                      "signed in", "sign out")
         self.browser = Browser(scene.stage.authority)
         self.step = 0
 
     def run(self):
         try:
-            self._road()
+            self._steps()
         except (BrowserError, StepError, KeyError) as error:
             step = self.steps[self.step - 1]
             raise StepError(f"{self.name}: step {self.step} ({step}) failed: {error}") from error
@@ -36,7 +34,7 @@ class SignIn:
             raise StepError(f"redirected to {shown(page.location)}, expected {prefix}...")
         return page.location
 
-    def _road(self):
+    def _steps(self):
         device, provider = self.scene.stage.device, self.scene.provider
         relay = device + "/webman/ssoclient/relay.html"
 
@@ -86,7 +84,7 @@ class SignIn:
         back = "?post_logout_redirect_uri=" + urllib.parse.quote(relay, safe="")
         if self.profile == "azure" and not url.endswith(back):
             raise StepError(f"the logout URL does not lead back to the device: {url}")
-        if "Nobody is signed in" not in self.browser.get(device + "/index.cgi").text:
+        if 'id="sign-in"' not in self.browser.get(device + "/index.cgi").body:
             raise StepError("the device still has a session")
         self._done(f"{shown(url)} (status {self.browser.get(url).status})")
         say(f"{self.name}: user name {expected}")

@@ -70,17 +70,34 @@ def write(path, text, mode=0o644):
 class SystemLog:
     """Reads /dev/log as a syslog daemon would and keeps the lines."""
 
+    MARK = "<14>mark"
+
     def __init__(self, path="/dev/log"):
         self.lines = []
+        self.heard = lambda line: None  # called with each line
         self._socket = socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM)
         self._socket.bind(path)
         os.chmod(path, 0o666)
+        self._path = path
+        self._marked = threading.Event()
         threading.Thread(target=self._read, daemon=True).start()
 
     def _read(self):
         while True:
             line = self._socket.recv(65536).decode("utf-8", "replace").rstrip("\0\n")
-            self.lines.append(line)
+            if line == self.MARK:
+                self._marked.set()
+            else:
+                self.lines.append(line)
+                self.heard(line)
+
+    def catch_up(self):
+        """Waits until all that was sent before is in `lines`."""
+        self._marked.clear()
+        with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as end:
+            end.sendto(self.MARK.encode(), self._path)
+        if not self._marked.wait(30):
+            raise StageError("the system log is not read")
 
 
 class Stage:
@@ -89,6 +106,8 @@ class Stage:
         self.device_port = device_port
         self.provider_name = provider_name
         self.provider_port = provider_port
+        # Where the servers listen; a relay in front of them may have the ports above (narrate.py).
+        self.device_listens, self.provider_listens = device_port, provider_port
         self.folder = FOLDER
         self.authority = FOLDER + "/ca.pem"
         self.logs = FOLDER + "/logs"
@@ -231,9 +250,7 @@ class Stage:
         for name in os.listdir(pages):
             shutil.copy(f"{pages}/{name}", WWW + "/webman/ssoclient")
         self.install_login(programs + "/login.cgi", WWW + "/webman/login.cgi", 0o4750)
-        entry = pwd.getpwnam(WEB_USER)
-        os.makedirs("/run/ssoclient", 0o700)
-        os.chown("/run/ssoclient", entry.pw_uid, entry.pw_gid)
+        self.set_options()
 
     @staticmethod
     def install_login(source, target, mode):
@@ -247,6 +264,12 @@ class Stage:
         """Makes the device's library folder known: a set-id program has no LD_LIBRARY_PATH."""
         write("/etc/ld.so.conf.d/qova.conf", QOVA + "/lib\n")
         run("ldconfig", "-X")
+
+    @staticmethod
+    def set_options(**values):
+        """Writes the login program's own settings; what is not given keeps its default."""
+        write(SETTINGS + "/login.conf", "# Written by the demo.\n" + "".join(
+            f"{key} = {value}\n" for key, value in values.items()))
 
     def configure(self, name, values, mode=0o600):
         """Writes one of the device's three settings files."""

@@ -6,22 +6,27 @@ import urllib.parse
 from chromium import TabError
 from scene import StepError, say, shown
 
-SCREEN = {"width": 760, "height": 480, "deviceScaleFactor": 1, "mobile": False}
+CLIENTS = {"azure": "the client for Azure AD, whose ID tokens are checked with a published key "
+                    "(RS256)",
+           "websphere": "the client for WebSphere, whose ID tokens are checked with the client "
+                        "secret (HS256)"}
+SCREEN = {"width": 760, "height": 560, "deviceScaleFactor": 1, "mobile": False}
+PHONE = {"width": 390, "height": 700, "deviceScaleFactor": 1, "mobile": True}
 
 
 class Visit:
     STEPS = ("device page", "provider's login page", "name and password", "relay page",
              "back at the origin", "sign out", "signed out on the device", "sign in again")
 
-    def __init__(self, scene, chromium, profile, road):
+    def __init__(self, scene, chromium, profile):
         self.scene, self.profile = scene, profile
-        self.name = f"{profile}/{road}"
+        self.name = profile
         self.tab = chromium.person()
         self.step = 0
 
     def run(self):
         try:
-            self._road()
+            self._steps()
         except (TabError, StepError) as error:
             step = self.STEPS[self.step - 1]
             raise StepError(f"{self.name}: step {self.step} ({step}) failed: {error}") from error
@@ -36,7 +41,7 @@ class Visit:
     def _at(self, prefix):
         self.tab.wait(lambda: self.tab.url.startswith(prefix), prefix)
 
-    def _road(self):
+    def _steps(self):
         device, provider, tab = self.scene.stage.device, self.scene.provider, self.tab
 
         self._begin()
@@ -84,7 +89,7 @@ class Visit:
 
         self._begin()
         tab.open(device + "/index.cgi")
-        if "Nobody is signed in." not in tab.text:
+        if not tab.all("#sign-in"):
             raise StepError("the device still has a session: " + tab.text)
         self._done(tab.text)
 
@@ -97,9 +102,10 @@ class Visit:
         """What happened, in one sentence."""
         provider = self.scene.provider
         end = "the device's page" if provider.comes_back else "the provider's page"
-        return (f"{self.name}: {self.scene.person.account} signed in at {provider.title}, was "
-                f"{self.scene.expected(self.profile)} on the device, and signed out, which ended "
-                f"on {end}; the next sign-in asks for the password")
+        profile = provider.setups[self.profile][0]
+        return (f"{self.name}: {CLIENTS[profile]}. {self.scene.person.account} signed in at "
+                f"{provider.title}, was {self.scene.expected(self.profile)} on the device, and "
+                f"signed out, which ended on {end}; the next sign-in asked for the password.")
 
 
 class Pictures:
@@ -118,13 +124,28 @@ class Pictures:
         self._picture(tab, "device", "#sign-in")
         tab.click("#sign-in")
         self._picture(tab, "provider", provider.fields[1])
+        tab.paste(provider.fields[0], provider.login_name)
+        tab.paste(provider.fields[1], self.scene.person.password)
+        tab.press("ENTER")
+        provider.agree(tab)
+        self._picture(tab, "device-signed-in", "#user")
+        self._relay(tab, relay)
+        tab.command("Emulation.setDeviceMetricsOverride", **PHONE)
+        tab.command("Emulation.setEmulatedMedia",
+                    features=[{"name": "prefers-color-scheme", "value": "dark"}])
+        tab.speak("de-DE,de")
+        self._picture(tab, "phone-dark-german", "#again")
+
+    def _relay(self, tab, relay):
+        """The three outcomes; the last one is a refusal."""
         tab.open(relay + "#success=true&origin=" + urllib.parse.quote("/index.cgi", safe=""))
         self._picture(tab, "relay-signed-in", "#onward")
-        # A callback that belongs to no login: what the person would see of it.
-        tab.open(device + "/webman/login.cgi?code=x&state=x")
-        self._picture(tab, "relay-not-signed-in", "#reason")
+        tab.open("about:blank")
         tab.open(relay)
         self._picture(tab, "relay-signed-out", "#onward")
+        tab.open("about:blank")
+        tab.open(relay + "#reason=timeout.K7Q2M9XB&success=false")
+        self._picture(tab, "relay-not-signed-in", "#again")
 
     def _picture(self, tab, name, sign):
         tab.find(sign)

@@ -1,7 +1,8 @@
-# Checks that are counted, and summed up in the end. Sourced after lib.sh, never run.
+# Checks that are counted, and summed up at the end. Sourced after lib.sh, never run.
 
 passed=0
 failed=0
+skipped=0
 
 # result STATUS WHAT: counts one check; STATUS is 0 if it passed.
 result() {
@@ -23,8 +24,14 @@ check() {
   [ "$rc" -eq 0 ] || printf '%s\n' "$output"
 }
 
+# omit WHAT REASON: one check that cannot run here.
+omit() {
+  skipped=$((skipped + 1))
+  echo "SKIPPED $1: $2"
+}
+
 # conclude: the last line of a script; its status is the script's.
 conclude() {
-  echo "$passed passed, $failed failed"
+  echo "$passed passed, $failed failed$([ $skipped -eq 0 ] || echo ", $skipped skipped")"
   [ "$failed" -eq 0 ]
 }

@@ -6,7 +6,6 @@
 #include <locale>
 #include <new>
 #include <stdexcept>
-#include <utility>
 
 #include "platform/platform.h"
 #include "sso/internal/http_body.h"
@@ -38,7 +37,7 @@ const Json::Value& FindKey(const Json::Value& key_set, const std::string& kid) {
   if (keys != nullptr && keys->isArray()) {
     for (const Json::Value& key : *keys) {
       const Json::Value* const key_id = FindMember(key, "kid");
-      if (key_id != nullptr && HasText(*key_id, kid)) return key;
+      if (key_id != nullptr && key_id->asString() == kid) return key;
     }
   }
   throw std::invalid_argument("kid does not exist in Azure verified kyes");
@@ -93,7 +92,12 @@ AzureSSOClient::AzureSSOClient() {
 AzureSSOClient::~AzureSSOClient() = default;
 
 std::string AzureSSOClient::GetAccessTokenReqURI(const Json::Value& params) {
-  return AuthorizationURL(authEndpoint, clientID, redirectURI, "openid", params);
+  AuthorizationRequest request;
+  request.endpoint = authEndpoint;
+  request.client_id = clientID;
+  request.redirect_uri = redirectURI;
+  request.scope = "openid";
+  return AuthorizationURL(request, params);
 }
 
 void AzureSSOClient::RedirectAuthEndpoint(const Json::Value& params) {
@@ -101,7 +105,12 @@ void AzureSSOClient::RedirectAuthEndpoint(const Json::Value& params) {
 }
 
 std::string AzureSSOClient::GetIDTokenReqParams() {
-  return TokenRequestBody(clientID, clientSecret, redirectURI, code);
+  TokenRequest request;
+  request.client_id = clientID;
+  request.client_secret = clientSecret;
+  request.redirect_uri = redirectURI;
+  request.code = code;
+  return TokenRequestBody(request);
 }
 
 void AzureSSOClient::ProcessTokenResponse(std::string response) {
@@ -128,7 +137,8 @@ void AzureSSOClient::RequestKeysInfo(std::string uri, Json::Value& keys) {
   } catch (const sso_err_resp& e) {
     syslog(LOG_ERR, "%s:%d request wellknown uri %s.", kUnit, __LINE__, e.what());
   }
-  // httpGet has done this already; once more does no harm.
+  // httpGet has cleaned up already: this gives up a reference that the host program may hold
+  // (docs/integrating.md). It stays: the sequence of calls is settled behaviour.
   CleanUpCurl();
 }
 

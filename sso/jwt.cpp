@@ -11,6 +11,7 @@
 #include <syslog.h>
 
 #include <algorithm>
+#include <climits>
 #include <cstring>
 #include <utility>
 
@@ -45,7 +46,7 @@ BioChain Base64Filter(BIO* memory) {
 }
 
 // The text in the alphabet of standard base64, padded to whole groups of four. A text of 4k + 1
-// characters gets three pads; it stands for nothing and must not decode.
+// characters gets three pads; it encodes nothing and must not decode.
 std::string StandardBase64(const char* text, size_t length) {
   std::string copy(length + (4 - length % 4) % 4, '=');
   std::transform(text, text + length, copy.begin(), [](char c) {
@@ -54,11 +55,18 @@ std::string StandardBase64(const char* text, size_t length) {
   return copy;
 }
 
+// OpenSSL counts in int: a longer text, with its pads, counts as undecodable.
+constexpr size_t kLongestText = INT_MAX - 3;
+
 // Decodes base64url text (RFC 4648, section 5), padded or not. Returns a zero-terminated buffer of
 // malloc, its decoded length (0 or less for what is not base64) in `*length`; or null for an empty
-// text and for want of memory.
+// text and when out of memory.
 char* Base64UrlDecode(const char* text, int* length) {
   const size_t text_length = strlen(text);
+  if (text_length > kLongestText) {
+    *length = 0;
+    return static_cast<char*>(std::calloc(1, 1));
+  }
   const std::string copy = StandardBase64(text, text_length);
   const BioChain chain = Base64Filter(BIO_new_mem_buf(copy.data(), static_cast<int>(copy.size())));
   if (chain == nullptr) return nullptr;
@@ -75,17 +83,18 @@ char* Base64UrlDecode(const char* text, int* length) {
   return buffer;
 }
 
-// The bytes that a base64url text stands for.
-struct Bytes {
-  explicit Bytes(const std::string& text) : buffer(Base64UrlDecode(text.c_str(), &length)) {}
+// The bytes that a base64url text encodes.
+class Bytes {
+ public:
+  explicit Bytes(const std::string& text) { buffer.reset(Base64UrlDecode(text.c_str(), &length)); }
 
   bool missing() const { return buffer == nullptr; }
   const unsigned char* data() const { return reinterpret_cast<unsigned char*>(buffer.get()); }
   int size() const { return std::max(length, 0); }
 
  private:
-  int length = 0;
   CText buffer;
+  int length = 0;
 };
 
 // Decodes a segment and parses it, up to its first zero byte.
@@ -98,26 +107,12 @@ Json::Value ParseSegment(const std::string& segment, const char* failure) {
   return value;
 }
 
-// The text that was signed: the two segments as they stand in the token, up to a zero byte. It is
-// put together in the body's memory, which has room for it (the token stood there), and lasts as
-// long as this object: a large token is not copied.
-class SigningInput {
- public:
-  SigningInput(const std::string& header, std::string& segment)
-      : front(header.size() + 1), body(segment) {
-    body.insert(0, header + '.');
-  }
-  ~SigningInput() { body.erase(0, front); }
-  SigningInput(const SigningInput&) = delete;
-  SigningInput& operator=(const SigningInput&) = delete;
-
-  const unsigned char* data() const { return reinterpret_cast<const unsigned char*>(body.data()); }
-  size_t size() const { return strlen(body.c_str()); }
-
- private:
-  const size_t front;
-  std::string& body;
-};
+// The text that was signed: the two segments as they are in the token, up to a zero byte.
+std::string SigningInput(const std::string& header, const std::string& body) {
+  std::string input = header + '.' + body;
+  input.resize(strlen(input.c_str()));
+  return input;
+}
 
 // An RSA key that owns both numbers; null if it cannot be made.
 RSAKey MakeRSAKey(const Bytes& modulus, const Bytes& exponent) {
@@ -146,7 +141,7 @@ PublicKey MakePublicKey(RSAKey rsa) {
   return key;
 }
 
-bool VerifyDigest(const SigningInput& input, const Bytes& signature, EVP_PKEY* key,
+bool VerifyDigest(const std::string& input, const Bytes& signature, EVP_PKEY* key,
                   const EVP_MD* md) {
   const DigestContext context(EVP_MD_CTX_new());
   if (context == nullptr) return false;
@@ -166,7 +161,7 @@ bool VerifyDigest(const SigningInput& input, const Bytes& signature, EVP_PKEY* k
   return true;
 }
 
-bool VerifyRSA(const SigningInput& input, const std::string& n, const std::string& e,
+bool VerifyRSA(const std::string& input, const std::string& n, const std::string& e,
                const std::string& signature, const EVP_MD* md) {
   const Bytes modulus(n);
   const Bytes exponent(e);
@@ -196,15 +191,16 @@ bool Base64UrlEncode(const unsigned char* bytes, unsigned count, std::string& te
   return true;
 }
 
-bool VerifyHMAC(const SigningInput& input, const std::string& key_text,
-                const std::string& signature, const EVP_MD* md) {
+bool VerifyHMAC(const std::string& input, const std::string& key_text, const std::string& signature,
+                const EVP_MD* md) {
   const Bytes key(key_text);
   // A text that decodes to nothing must not pass as the empty key.
   if (key.missing() || key.size() == 0) return false;
 
   unsigned char mac[EVP_MAX_MD_SIZE];
   unsigned count = 0;
-  if (HMAC(md, key.data(), key.size(), input.data(), input.size(), mac, &count) == nullptr) {
+  if (HMAC(md, key.data(), key.size(), reinterpret_cast<const unsigned char*>(input.data()),
+           input.size(), mac, &count) == nullptr) {
     return false;
   }
   std::string expected;
@@ -212,15 +208,6 @@ bool VerifyHMAC(const SigningInput& input, const std::string& key_text,
 }
 
 }  // namespace
-
-jwt_exception::jwt_exception(const std::string& message) : std::runtime_error(message) {}
-jwt_exception::~jwt_exception() = default;
-
-jwt_not_support::jwt_not_support(const std::string& message) : jwt_exception(message) {}
-jwt_not_support::~jwt_not_support() = default;
-
-jwt_verify_failed::jwt_verify_failed(const std::string& message) : jwt_exception(message) {}
-jwt_verify_failed::~jwt_verify_failed() = default;
 
 Jwt::Jwt(std::string token) {
   SSO::Pieces<3> segments;

@@ -2,8 +2,8 @@
 
 #include <syslog.h>
 
-#include <cstdlib>
 #include <cstring>
+#include <iterator>
 #include <new>
 #include <utility>
 
@@ -21,7 +21,7 @@ namespace {
 
 constexpr char kUnit[] = "sso.cpp";
 
-// The name of the supported profile that single sign-on is switched on with.
+// The name of the profile that single sign-on is enabled with.
 std::string EnabledProfile() {
   Json::Value profile;
   if (!ReadJsonFile(kProfilePath, profile)) throw sso_op_failed("read profile file failed.");
@@ -32,11 +32,20 @@ std::string EnabledProfile() {
 
   const Json::Value* const name = FindString(profile, kProfileKey);
   if (name == nullptr) throw sso_op_failed("not specify sso profile");
-  for (const char* const supported : kSupportedProfiles) {
-    if (name->asString() == supported) return supported;
-  }
-  throw sso_exception("profile not support.");
+  return name->asString();
 }
+
+template <typename Client>
+void Login(const std::string& code, std::string& user) {
+  Client().OpenIDConnectLogin(code, user);
+}
+
+constexpr struct {
+  const char* profile;
+  void (*login)(const std::string& code, std::string& user);
+} kLogins[] = {{kAzureProfile, Login<AzureSSOClient>},
+               {kWebSphereProfile, Login<WebSphereSSOClient>}};
+static_assert(std::size(kLogins) == std::size(kSupportedProfiles));  // each has its login
 
 // Finds the "origin" that the login program packed into a state; false if there is none.
 bool FindOrigin(const std::string& state, std::string& origin) {
@@ -153,13 +162,10 @@ void SSOClient::OpenIDConnectLogin(std::string value, std::string& user) {
 
 void OIDCLogin(const std::string& code, std::string& user) {
   const std::string profile = EnabledProfile();
-  if (profile == kAzureProfile) {
-    AzureSSOClient().OpenIDConnectLogin(code, user);
-  } else if (profile == kWebSphereProfile) {
-    WebSphereSSOClient().OpenIDConnectLogin(code, user);
-  } else {
-    std::abort();  // a profile was added to the list and not here
+  for (const auto& supported : kLogins) {
+    if (profile == supported.profile) return supported.login(code, user);
   }
+  throw sso_exception("profile not support.");
 }
 
 std::string GetSSORelayURL(bool success, const std::string& state, const std::string& reason) {

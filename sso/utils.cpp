@@ -3,20 +3,12 @@
 
 #include "sso/utils.h"
 
-#include <fcntl.h>
-#include <json/reader.h>
-#include <json/writer.h>
 #include <openssl/md5.h>
 #include <syslog.h>
-#include <unistd.h>
 
-#include <algorithm>
-#include <cerrno>
 #include <new>
 
-#include "platform/platform.h"
 #include "sso/internal/encoding.h"
-#include "sso/internal/json.h"
 #include "sso/internal/libcurl.h"
 #include "sso/internal/owned.h"
 
@@ -70,47 +62,7 @@ void Transfer(const std::string& url, const std::string* body, std::string& resp
   if (result != CURLE_OK) throw sso_err_resp(curl.easy_strerror(result));
 }
 
-// An open file.
-class File {
- public:
-  explicit File(const char* path) : descriptor(open(path, O_RDONLY | O_CLOEXEC)) {}
-  ~File() {
-    if (descriptor >= 0) close(descriptor);
-  }
-  File(const File&) = delete;
-  File& operator=(const File&) = delete;
-
-  // Appends all that is left of the file to `text`.
-  bool ReadAll(std::string& text) const {
-    char chunk[4096];
-    for (;;) {
-      const ssize_t count = read(descriptor, chunk, sizeof chunk);
-      if (count == 0) return true;
-      if (count > 0) {
-        text.append(chunk, static_cast<size_t>(count));
-      } else if (errno != EINTR) {
-        return false;  // not open, a directory, or a broken read
-      }
-    }
-  }
-
- private:
-  const int descriptor;
-};
-
 }  // namespace
-
-sso_exception::sso_exception(const std::string& message) : std::runtime_error(message) {}
-sso_exception::~sso_exception() = default;
-
-sso_err_resp::sso_err_resp(const std::string& message) : sso_exception(message) {}
-sso_err_resp::~sso_err_resp() = default;
-
-sso_op_failed::sso_op_failed(const std::string& message) : sso_exception(message) {}
-sso_op_failed::~sso_op_failed() = default;
-
-sso_not_implemented::sso_not_implemented(const std::string& message) : sso_exception(message) {}
-sso_not_implemented::~sso_not_implemented() = default;
 
 void httpGet(const std::string& url, std::string& response, bool verifySSL,
              unsigned (*writeFn)(void* data, unsigned size, unsigned count, void* userData)) {
@@ -121,16 +73,6 @@ void httpPost(const std::string& url, const std::string& body, std::string& resp
               bool verifySSL,
               unsigned (*writeFn)(void* data, unsigned size, unsigned count, void* userData)) {
   Transfer(url, &body, response, verifySSL, writeFn);
-}
-
-void AppendURLEncoded(const std::string& value, std::string& text) {
-  const size_t capacity = 3 * value.size();
-  const CText encoded(static_cast<char*>(std::calloc(capacity + 1, 1)));
-  if (encoded != nullptr && QOVACGIURLEncode(value.c_str(), encoded.get(), capacity) == 0) {
-    text += encoded.get();
-  } else {
-    text += value;  // unencoded: callers cannot tell
-  }
 }
 
 std::string URLEncode(const std::string& text) {
@@ -158,63 +100,6 @@ std::string MD5Digest(std::string text) {
   }
   result = hex.get();
   return result;
-}
-
-// jsoncpp would rather see its newer reader and writer used; their language and output differ.
-#if defined(__GNUC__)
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
-#endif
-bool ParseJson(const char* begin, const char* end, Json::Value& value) {
-  try {
-    return Json::Reader().parse(begin, end, value, true);
-  } catch (const Json::Exception&) {
-    return false;  // nested deeper than the reader goes
-  }
-}
-
-std::string WriteJson(const Json::Value& value) {
-  return Json::FastWriter().write(value);
-}
-#if defined(__GNUC__)
-#pragma GCC diagnostic pop
-#endif
-
-bool ReadJsonFile(const char* path, Json::Value& value) {
-  std::string text;
-  return File(path).ReadAll(text) && ParseJson(text, value);
-}
-
-const Json::Value* FindMember(const Json::Value& value, const char* name) {
-  if (!value.isObject()) return nullptr;
-  return value.find(name, name + std::char_traits<char>::length(name));
-}
-
-const Json::Value* FindString(const Json::Value& value, const char* name) {
-  const Json::Value* const member = FindMember(value, name);
-  return member != nullptr && member->isString() ? member : nullptr;
-}
-
-std::string MemberText(const Json::Value& value, const char* name) {
-  const Json::Value* const member = FindMember(value, name);
-  return member != nullptr ? member->asString() : std::string();
-}
-
-bool HasText(const Json::Value& value, const std::string& text) {
-  const char* begin = nullptr;
-  const char* end = nullptr;
-  if (!value.getString(&begin, &end)) return value.asString() == text;  // not a string
-  return std::equal(begin, end, text.begin(), text.end());
-}
-
-void TakeSetting(const Json::Value& settings, const char* name, bool& field) {
-  const Json::Value* const member = FindMember(settings, name);
-  if (member != nullptr && member->isBool()) field = member->asBool();
-}
-
-void TakeSetting(const Json::Value& settings, const char* name, std::string& field) {
-  const Json::Value* const member = FindString(settings, name);
-  if (member != nullptr) field = member->asString();
 }
 
 }  // namespace SSO

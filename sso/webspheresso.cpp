@@ -4,6 +4,7 @@
 
 #include <stdexcept>
 
+#include "sso/internal/encoding.h"
 #include "sso/internal/json.h"
 #include "sso/internal/provider.h"
 #include "sso/jwt.h"
@@ -43,7 +44,12 @@ WebSphereSSOClient::WebSphereSSOClient() {
 WebSphereSSOClient::~WebSphereSSOClient() = default;
 
 std::string WebSphereSSOClient::GetAccessTokenReqURI(const Json::Value& stateInfo) {
-  return AuthorizationURL(authEndpoint, clientID, redirectURI, "openid profile email", stateInfo);
+  AuthorizationRequest request;
+  request.endpoint = authEndpoint;
+  request.client_id = clientID;
+  request.redirect_uri = redirectURI;
+  request.scope = "openid profile email";
+  return AuthorizationURL(request, stateInfo);
 }
 
 void WebSphereSSOClient::RedirectAuthEndpoint(const Json::Value& stateInfo) {
@@ -51,7 +57,12 @@ void WebSphereSSOClient::RedirectAuthEndpoint(const Json::Value& stateInfo) {
 }
 
 std::string WebSphereSSOClient::GetIDTokenReqParams() {
-  return TokenRequestBody(clientID, clientSecret, redirectURI, code);
+  TokenRequest request;
+  request.client_id = clientID;
+  request.client_secret = clientSecret;
+  request.redirect_uri = redirectURI;
+  request.code = code;
+  return TokenRequestBody(request);
 }
 
 void WebSphereSSOClient::ProcessTokenResponse(std::string response) {

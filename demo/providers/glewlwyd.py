@@ -71,7 +71,7 @@ class Glewlwyd:
     fields = "#username", "#password"  # of the login page
     comes_back = False  # after a logout
     goodbye = "Session closed"
-    why_not_back = "it returns only to a client that sends an ID token, which the device does not"
+    why_not_back = "it closes the session and does not redirect"
     setups = BOTH
 
     def __init__(self, stage, person):
@@ -86,7 +86,7 @@ class Glewlwyd:
     def start(self):
         self._files()
         self._stage.spawn("glewlwyd", ["glewlwyd", "-c", self._folder + "/glewlwyd.conf"], USER)
-        self._stage.wait_for("glewlwyd", self._stage.provider_port)
+        self._stage.wait_for("glewlwyd", self._stage.provider_listens)
         self._take_over()
         self._add_person()
 
@@ -106,7 +106,7 @@ class Glewlwyd:
         types = ", ".join(f'{{ extension = "{extension}" mime_type = "{kind}" }}'
                           for extension, kind in TYPES.items())
         write(folder + "/glewlwyd.conf", CONFIG.format(
-            port=self._stage.provider_port, url=self.url, folder=folder, types=types, log=log,
+            port=self._stage.provider_listens, url=self.url, folder=folder, types=types, log=log,
             certificate=certificate, authority=self._stage.authority))
         for path in (folder, folder + "/glewlwyd.db", folder + "/tls.key"):
             os.chown(path, owner, 0)

@@ -95,9 +95,8 @@ class Settings(Common):
 class Liberty(Twin):
     title = "twin of WebSphere Liberty"
     fields = "input[name=j_username]", "input[name=j_password]"  # of the login page
-    comes_back = False  # after a logout
+    comes_back = True  # after a logout: the login program sends the ID token along
     goodbye = "You are logged out."
-    why_not_back = "it returns only to a client that sends an ID token, which the device does not"
     settings_class = Settings
     session_cookie = "LtpaToken2"
     setups = {"websphere": ("websphere", "add_websphere")}

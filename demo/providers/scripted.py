@@ -5,6 +5,7 @@ the Azure client, HS256 under the client's secret for the WebSphere client. A sc
 one thing at a time, see Script. Everything that it was asked is kept in `seen`.
 """
 
+import contextlib
 import dataclasses
 import html
 import json
@@ -25,6 +26,7 @@ class Script:
     send instead."""
     refuse: dict = None        # parameters of an error answer to the authorization request
     claims: object = None      # changes the claims of the ID token
+    raw_claims: object = None  # changes their text, in bytes
     header: object = None      # changes the header of the ID token
     signature: object = None   # changes the bytes of the signature
     sign: object = None        # signs instead of the provider's key: bytes to signature
@@ -32,6 +34,7 @@ class Script:
     document: object = None    # changes (path, status, type, body) of "wellknown" and "keys"
     silent: tuple = ()         # paths ("token", "keys"...) that take the request and do not answer
     cut: tuple = ()            # paths whose answer ends in its middle
+    flood: dict = dataclasses.field(default_factory=dict)  # per path: writes to the connection
     leave: bool = False        # nobody listens any more once a code is handed out
 
 
@@ -65,7 +68,7 @@ class Scripted(Site):
     # -- set-up ----------------------------------------------------------------------------
 
     def start(self):
-        self.listen(self._stage.provider_port,
+        self.listen(self._stage.provider_listens,
                     self._stage.certificate(self._stage.provider_name))
 
     def stop(self, but=None):
@@ -194,6 +197,9 @@ class Scripted(Site):
         if self.script.header is not None:
             header = self.script.header(header)
         signed = signing_input(header, claims)
+        if self.script.raw_claims is not None:
+            parts = [self.script.raw_claims(json.dumps(claims).encode())]
+            signed = signed.split(".")[0] + "." + base64url(parts[0])
         signature = (self.script.sign or realm.sign)(signed.encode())
         if self.script.signature is not None:
             signature = self.script.signature(signature)
@@ -230,6 +236,11 @@ class _Handler(Handler):
         if path in provider.script.silent:
             provider.hold()
             self.close_connection = True
+            return
+        if path in provider.script.flood:
+            self.close_connection = True
+            with contextlib.suppress(OSError):  # whoever asked has had enough
+                provider.script.flood[path](self.wfile)
             return
         answer = provider.answer_at(name, path, request)
         if path == "authorization" and request.form is not None and provider.script.leave:

@@ -4,6 +4,7 @@
 //
 // A saved id does not survive exec, a real one does: root becomes the real identity, the web
 // server's stays the effective one, and the login program turns root into its saved identity.
+#include <signal.h>
 #include <syslog.h>
 #include <unistd.h>
 
@@ -13,20 +14,18 @@
 #include <string>
 #include <vector>
 
+#include "environment.h"
+
 namespace {
 
 constexpr char kProgram[] = SSOCLIENT_LOGIN_PROGRAM;
 static_assert(kProgram[0] == '/', "the path of the login program is absolute");
 
-// What the login program reads, and what libcurl needs to know of a proxy. Nothing else of the web
-// server's environment gets to it. (HTTP_PROXY could be a header of the browser's.)
-constexpr const char* kKept[] = {"REQUEST_METHOD", "QUERY_STRING",       "HTTP_COOKIE",
-                                 "SSO_LOGIN_ROAD", "SSO_LOGIN_DEADLINE", "https_proxy",
-                                 "no_proxy"};
-
+// What the login program reads. Nothing else of the web server's environment gets to it: the rest
+// comes from its settings file.
 std::vector<std::string> Environment() {
-  std::vector<std::string> kept = {"PATH=/usr/bin:/bin"};
-  for (const char* name : kKept) {
+  std::vector<std::string> kept = {std::string("PATH=") + kPath};
+  for (const char* name : kRequestVariables) {
     if (const char* value = std::getenv(name)) kept.push_back(std::string(name) + "=" + value);
   }
   return kept;
@@ -41,6 +40,15 @@ void TakeIdentity() {
   if (setresgid(0, gid, gid) != 0 || setresuid(0, uid, uid) != 0) {
     throw std::runtime_error("launcher cannot set the identities");
   }
+}
+
+// Whoever starts the launcher chooses its signal mask. A full system log must not hold it for ever.
+void SetDeadline() {
+  sigset_t none;
+  sigemptyset(&none);
+  sigprocmask(SIG_SETMASK, &none, nullptr);
+  signal(SIGALRM, SIG_DFL);
+  alarm(30);  // the login program sets its own
 }
 
 [[noreturn]] void Launch() {
@@ -59,6 +67,7 @@ void TakeIdentity() {
 
 int main() {
   try {
+    SetDeadline();
     Launch();
   } catch (const std::exception& error) {
     syslog(LOG_ERR, "sign-in failed: %s", error.what());

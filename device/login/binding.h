@@ -1,42 +1,45 @@
-// Ties a login to the browser that started it.
+// Ties a login to the browser that started it, without a word kept on the device.
 //
-// A random value goes into a cookie, and its digest into the state. Whoever comes back with a
-// state must bring the cookie too: a link with somebody else's code and state (login cross-site
-// request forgery, code injection) is of no use in another browser. Each cookie serves once.
-//
-// There is one cookie, so there is one login at a time: of two that are under way in two tabs, the
-// first is refused when it comes back, and uses up the second one's ticket.
+// A login has a random name. It goes into the state, and into the name of a cookie whose value is
+// the time and a seal of name, time and state. Whoever comes back with a state must bring its
+// cookie too: a link with somebody else's code and state (login cross-site request forgery, code
+// injection) is of no use in another browser. Each login has its own cookie, so that two tabs can
+// sign in at once. A ticket serves once: those that were used are remembered while they are valid.
 #pragma once
 
 #include <json/value.h>
 
+#include <ctime>
 #include <string>
+#include <vector>
 
 #include "cgi.h"
 
 namespace binding {
 
-// Ticket is one login that is about to start.
+constexpr char kMember[] = "binding";  // the member of the state that holds the name
+
+// Ticket is a login that came back in the browser that started it.
 struct Ticket {
-  std::string key;     // the random value; the browser's secret
-  std::string digest;  // goes into the state as the member that kMember names
-  std::string cookie;  // the text of the Set-Cookie header
+  Json::Value state;  // decoded, as it was sent
+  std::string seal;
+  time_t expiry;
+  std::string expire;  // the text of the Set-Cookie header that deletes the cookie
 };
 
-constexpr char kMember[] = "binding";
+// NewName returns a name for a login.
+std::string NewName();
 
-// Issue makes a ticket.
-Ticket Issue();
+// Cookies returns the texts of the Set-Cookie headers for a login: its own cookie, and the deletion
+// of the browser's oldest ones if it has too many.
+std::vector<std::string> Cookies(const cgi::Request& request, const std::string& name,
+                                 const std::string& state);
 
-// Remember keeps a ticket until its login comes back. `state` is the state that was sent, or
-// empty if the caller does not know it; if it is known, no other one will be accepted.
-void Remember(const Ticket& ticket, const std::string& state);
+// Find returns the ticket of the request's state. Nothing is used up by it. Throws Failure if the
+// login was not started in this browser, or long ago.
+Ticket Find(const cgi::Request& request);
 
-// Redeem uses up the request's ticket and returns the decoded state. Throws std::runtime_error
-// if the request has no ticket that waits, or the state is not the one that belongs to it.
-Json::Value Redeem(const cgi::Request& request);
-
-// Expire returns the header that deletes the cookie.
-std::string Expire();
+// Redeem uses a ticket up. Throws Failure if it was used before.
+void Redeem(const Ticket& ticket);
 
 }  // namespace binding

@@ -1,11 +1,20 @@
 #include "cgi.h"
 
+#include <unistd.h>
+
+#include <cerrno>
 #include <cstdlib>
 #include <iostream>
 #include <stdexcept>
 
+#include "environment.h"
+#include "process.h"
+
 namespace cgi {
 namespace {
+
+constexpr size_t kLongestForm = 4096;
+constexpr char kFormType[] = "application/x-www-form-urlencoded";
 
 std::string Environment(const char* name) {
   const char* value = std::getenv(name);
@@ -65,11 +74,48 @@ const std::string& OneLine(const std::string& text) {
   return text;
 }
 
+void Write(const std::string& answer) {
+  process::Answered();
+  std::cout << answer << std::flush;
+}
+
 }  // namespace
 
 Request ReadRequest() {
-  return {Environment("REQUEST_METHOD"), ReadQuery(Environment("QUERY_STRING")),
-          ReadCookies(Environment("HTTP_COOKIE"))};
+  Values variables;
+  for (const char* name : kRequestVariables) variables[name] = Environment(name);
+  clearenv();
+  setenv("PATH", kPath, 1);
+  Request request;
+  request.method = variables["REQUEST_METHOD"];
+  request.script = variables["SCRIPT_NAME"];
+  request.address = variables["REMOTE_ADDR"];
+  request.query_text = variables["QUERY_STRING"];
+  request.query = ReadQuery(request.query_text);
+  request.cookies = ReadCookies(variables["HTTP_COOKIE"]);
+  request.content_type = variables["CONTENT_TYPE"];
+  request.content_length = variables["CONTENT_LENGTH"];
+  request.host = variables["HTTP_HOST"];
+  request.languages = variables["HTTP_ACCEPT_LANGUAGE"];
+  request.origin = variables["HTTP_ORIGIN"];
+  request.fetch_site = variables["HTTP_SEC_FETCH_SITE"];
+  request.fetch_dest = variables["HTTP_SEC_FETCH_DEST"];
+  return request;
+}
+
+Values ReadForm(const Request& request) {
+  // Parameters may follow: "; charset=UTF-8".
+  const std::string type = request.content_type.substr(0, request.content_type.find(';'));
+  const size_t size = std::strtoul(request.content_length.c_str(), nullptr, 10);
+  if (type != kFormType || size > kLongestForm) return {};
+  std::string text(size, '\0');
+  for (size_t done = 0; done < size;) {
+    const ssize_t got = read(STDIN_FILENO, &text[done], size - done);
+    if (got < 0 && errno == EINTR) continue;
+    if (got <= 0) return {};
+    done += static_cast<size_t>(got);
+  }
+  return ReadQuery(text);
 }
 
 Values ReadQuery(const std::string& text) {
@@ -87,26 +133,28 @@ std::string Value(const Values& values, const std::string& name) {
   return found == values.end() ? "" : found->second;
 }
 
-std::string Cookie(const std::string& name, const std::string& value) {
-  return name + "=" + value + "; Path=/; Secure; HttpOnly; SameSite=Lax" +
-         (value.empty() ? "; Max-Age=0" : "");
-}
-
-void BeginRedirect(const std::vector<std::string>& cookies) {
-  static bool begun = false;
-  if (begun) return;
-  std::string head;
-  // The status comes first: there are servers that look for it nowhere else.
-  head += "Status: 302 Found\nCache-Control: no-store\n";
-  for (const std::string& cookie : cookies) head += "Set-Cookie: " + OneLine(cookie) + "\n";
-  begun = true;
-  std::cout << head;
+std::string Cookie(const std::string& name, const std::string& value, int seconds) {
+  std::string cookie = name + "=" + value + "; Path=/; Secure; HttpOnly; SameSite=Lax";
+  if (value.empty() || seconds > 0) cookie += "; Max-Age=" + std::to_string(seconds);
+  return cookie;
 }
 
 void Redirect(const std::string& location, const std::vector<std::string>& cookies) {
-  const std::string line = "Location: " + OneLine(location) + "\n\n";
-  BeginRedirect(cookies);
-  std::cout << line;
+  // The status comes first: there are servers that look for it nowhere else.
+  std::string head = "Status: 302 Found\nCache-Control: no-store\n";
+  for (const std::string& cookie : cookies) head += "Set-Cookie: " + OneLine(cookie) + "\n";
+  Write(head + "Location: " + OneLine(location) + "\n\n");
+}
+
+void Page(const std::string& html, const std::vector<std::string>& headers) {
+  // With "no-referrer" a browser would hide where a form comes from: "Origin: null".
+  std::string head =
+      "Status: 200 OK\nCache-Control: no-store\nContent-Type: text/html; charset=utf-8\n"
+      "X-Content-Type-Options: nosniff\nReferrer-Policy: same-origin\n"
+      "Content-Security-Policy: default-src 'none'; style-src 'self'; img-src 'self'; "
+      "base-uri 'none'; form-action 'self' https:; frame-ancestors 'none'\n";
+  for (const std::string& header : headers) head += OneLine(header) + "\n";
+  Write(head + "\n" + html);
 }
 
 std::string EscapeHTML(const std::string& text) {

@@ -9,17 +9,30 @@ namespace cgi {
 
 using Values = std::map<std::string, std::string>;
 
-// Request is what the browser asked for. Of a parameter or cookie that comes more than once the
-// first counts.
+// Request is what the browser asked for. If a parameter or cookie is sent more than once, the
+// first one counts.
 struct Request {
   std::string method;
+  std::string script;   // the path of this program
+  std::string address;  // the client's
   Values query;
+  std::string query_text;  // as it was sent
   Values cookies;
+  std::string content_type;  // of the body, which is not read yet
+  std::string content_length;
+  std::string host;
+  std::string languages;   // Accept-Language
+  std::string origin;      // Origin: which site's page sent a form
+  std::string fetch_site;  // Sec-Fetch-Site, Sec-Fetch-Dest: what browsers say about the request
+  std::string fetch_dest;
 };
 
-// ReadRequest takes the request from the environment that the web server set. The body is not
-// read.
+// ReadRequest takes the request from the environment that the web server set, and leaves an
+// environment that holds nothing but PATH.
 Request ReadRequest();
+
+// ReadForm reads the values of the form that was posted; none if it is no form, or a large one.
+Values ReadForm(const Request& request);
 
 // ReadQuery takes a query apart: names and values, decoded.
 Values ReadQuery(const std::string& text);
@@ -27,20 +40,20 @@ Values ReadQuery(const std::string& text);
 // Value returns the value of a name, empty if there is none.
 std::string Value(const Values& values, const std::string& name);
 
-// Cookie returns the text of a Set-Cookie header for this host alone, kept until the browser
-// ends; an empty value deletes the cookie.
-std::string Cookie(const std::string& name, const std::string& value);
+// Cookie returns the text of a Set-Cookie header for this host alone, kept for `seconds`, or until
+// the browser ends if that is 0; an empty value deletes the cookie.
+std::string Cookie(const std::string& name, const std::string& value, int seconds = 0);
 
-// BeginRedirect writes the head of a redirect but for its Location, which must follow. A second
-// call writes nothing: the head is out. Throws std::invalid_argument, before anything is
-// written, if a cookie holds a control character: a line break would start a header of its own.
-void BeginRedirect(const std::vector<std::string>& cookies);
-
-// Redirect sends the browser to `location` and ends the header. Throws as BeginRedirect does,
-// for the location too.
+// Redirect sends the browser to `location`. Throws std::invalid_argument, before anything is
+// written, if a cookie or the location holds a control character: a line break would start a
+// header of its own.
 void Redirect(const std::string& location, const std::vector<std::string>& cookies);
 
-// EscapeHTML returns `text` so that it stands for itself in a page.
+// Page sends a page that no other site can show in a frame, and that runs no scripts. `headers`
+// are lines of the head, which throw as those of Redirect do.
+void Page(const std::string& html, const std::vector<std::string>& headers);
+
+// EscapeHTML returns `text` so that a page shows it as it is.
 std::string EscapeHTML(const std::string& text);
 
 }  // namespace cgi

@@ -1,5 +1,6 @@
 #include "exchange.h"
 
+#include <fcntl.h>
 #include <poll.h>
 #include <signal.h>
 #include <sys/wait.h>
@@ -8,77 +9,62 @@
 #include <cerrno>
 #include <chrono>
 #include <exception>
-#include <stdexcept>
 
-#include "reason.h"
-#include "sso/azuresso.h"
-#include "sso/profile.h"
-#include "sso/sso.h"
-#include "sso/utils.h"
-#include "sso/webspheresso.h"
-#include "state.h"
-
-using namespace QOVA::SSO;
+#include "failure.h"
+#include "process.h"
+#include "signin.h"
+#include "utf8.h"
 
 namespace {
 
-constexpr char kUser = '+';
-constexpr char kFailure = '-';
+// The child's answer is a few lines: "user", the name and the ID token, or the number of the
+// failure's code, its text and what the provider says. It fits into one write to a pipe, so there
+// is no half of it.
+constexpr char kUser[] = "user";
 constexpr size_t kLongestAnswer = 4096;
+constexpr size_t kLongestLine = 1000;
+constexpr size_t kLongestToken = 3500;
 
-// What OIDCLogin does, and the check of the nonce that it leaves to its caller: the ID token
-// must be the answer to the very request whose state came back.
-template <class Client>
-std::string CheckedLogin(const std::string& code, const Json::Value& state) {
-  Client client;
-  std::string user;
-  client.OpenIDConnectLogin(code, user);
-  Json::Value claims;
-  client.GetUserInfo(claims);
-  const std::string digest = MD5Digest(Member(claims, "nonce"));
-  if (digest.empty() || digest != Member(state, "nonce")) {
-    throw std::runtime_error("nonce does not belong to this login");
+std::string Lines(const Failure& failure) {
+  std::string lines = std::to_string(static_cast<int>(failure.code)) + "\n";
+  for (const std::string& text :
+       {std::string(failure.what()), failure.provider.error, failure.provider.description}) {
+    lines += OneLine(text, kLongestLine) + "\n";
   }
-  return user;
+  return lines;
 }
 
-std::string Login(const std::string& code, const Json::Value& state, const std::string& profile,
-                  bool plain) {
-  if (plain) {
-    std::string user;
-    OIDCLogin(code, user);
-    return user;
-  }
-  if (profile == "azure") return CheckedLogin<AzureSSOClient>(code, state);
-  if (profile == "websphere") return CheckedLogin<WebSphereSSOClient>(code, state);
-  throw std::runtime_error("profile not support.");
-}
-
-// The child's work; its answer is a mark and a text.
-std::string Answer(const std::string& code, const Json::Value& state, bool plain) {
-  SSOProfile profile;
+// The child's work. The library's constructors are part of it, so they are in the try block too.
+std::string Answer(const SignIn& work) {
   try {
-    if (!profile.SSOIsEnable()) throw std::runtime_error("sso does not enable.");
-    return kUser + Login(code, state, profile.GetSSOProfile(), plain);
+    const SignedIn result = Run(work);
+    const bool fits = result.token.size() <= kLongestToken && !HasControl(result.token);
+    return std::string(kUser) + "\n" + result.user + "\n" + (fits ? result.token : "") + "\n";
+  } catch (const Failure& failure) {
+    return Lines(failure);
   } catch (const std::exception& error) {
-    return kFailure + Redact(error.what(), {code, profile.GetSSOClient()->GetClientSecret()});
+    return Lines(Failure(FailureCode::kInternal, error.what()));
   }
 }
 
-void WriteAll(int fd, const std::string& text) {
-  for (size_t done = 0; done < text.size();) {
-    const ssize_t size = write(fd, text.data() + done, text.size() - done);
-    if (size < 0 && errno == EINTR) continue;
-    if (size <= 0) return;
-    done += static_cast<size_t>(size);
-  }
+[[noreturn]] void RunChild(int pipe, const SignIn& work) {
+  process::Answered();  // the parent does that
+  // The web server waits until nobody holds its pipe any more.
+  const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
+  dup2(null, STDIN_FILENO);
+  dup2(null, STDOUT_FILENO);
+  process::Confine(work.parent, work.settings.deadline);
+  const std::string answer = Answer(work);
+  const bool written =
+      write(pipe, answer.data(), answer.size()) == static_cast<ssize_t>(answer.size());
+  _exit(written ? 0 : 1);
 }
 
 // Reads until the child closes its end; false at the deadline.
 bool ReadAll(int fd, int seconds, std::string& out) {
   using Clock = std::chrono::steady_clock;
   const Clock::time_point end = Clock::now() + std::chrono::seconds(seconds);
-  for (;;) {
+  while (out.size() <= kLongestAnswer) {
     const auto left =
         std::chrono::duration_cast<std::chrono::milliseconds>(end - Clock::now()).count();
     if (left <= 0) return false;
@@ -90,33 +76,53 @@ bool ReadAll(int fd, int seconds, std::string& out) {
     if (size <= 0) return true;
     out.append(buffer, static_cast<size_t>(size));
   }
+  return true;
 }
 
-[[noreturn]] void RunChild(int fd, const std::string& code, const Json::Value& state,
-                           const Settings& settings) {
-  // Should the web server end the parent, the child must not wait on for ever.
-  alarm(static_cast<unsigned>(settings.deadline) * 2);
-  WriteAll(fd, Answer(code, state, settings.plain).substr(0, kLongestAnswer));
-  _exit(0);
+// The lines of an answer; without a line feed at its end, the last one is missing.
+std::vector<std::string> Split(const std::string& answer) {
+  std::vector<std::string> lines;
+  size_t begin = 0;
+  for (size_t end; (end = answer.find('\n', begin)) != std::string::npos; begin = end + 1) {
+    lines.push_back(answer.substr(begin, end - begin));
+  }
+  return lines;
+}
+
+SignedIn ResultOf(const std::vector<std::string>& lines) {
+  if (lines.size() == 3 && lines[0] == kUser) return {lines[1], lines[2]};
+  if (lines.size() == 4) {
+    const FailureCode code = static_cast<FailureCode>(std::stoi(lines[0]));
+    throw Failure(code, lines[1], {lines[2], lines[3]});
+  }
+  throw Failure(FailureCode::kInternal, "sign-in process gave no answer");
+}
+
+// Why a child that was not ended here has no answer.
+std::string Describe(int status) {
+  if (!WIFSIGNALED(status)) return "sign-in process ended without an answer";
+  return std::string("sign-in process ended by a signal: ") + strsignal(WTERMSIG(status));
 }
 
 }  // namespace
 
-std::string Exchange(const std::string& code, const Json::Value& state, const Settings& settings) {
+SignedIn Exchange(const std::string& code, const Json::Value& state, const std::string& profile,
+                  const Settings& settings) {
+  const SignIn work{code, state, profile, settings, getpid()};
   int ends[2];
-  if (pipe(ends) != 0) throw std::runtime_error("no pipe");
+  if (pipe2(ends, O_CLOEXEC) != 0) throw Failure(FailureCode::kInternal, "no pipe");
   const pid_t child = fork();
-  if (child == 0) RunChild(ends[1], code, state, settings);
+  if (child == 0) RunChild(ends[1], work);
   close(ends[1]);
   std::string answer;
   const bool ended = child > 0 && ReadAll(ends[0], settings.deadline, answer);
   close(ends[0]);
-  if (child < 0) throw std::runtime_error("no child process");
+  if (child < 0) throw Failure(FailureCode::kInternal, "no child process");
   if (!ended) kill(child, SIGKILL);
-  while (waitpid(child, nullptr, 0) < 0 && errno == EINTR) {
+  int status = 0;
+  while (waitpid(child, &status, 0) < 0 && errno == EINTR) {
   }
-  if (!ended) throw std::runtime_error("provider did not answer in time");
-  if (answer.empty()) throw std::runtime_error("sign-in process ended without an answer");
-  if (answer[0] != kUser) throw std::runtime_error(answer.substr(1));
-  return answer.substr(1);
+  if (!ended) throw Failure(FailureCode::kTimeout, "provider did not answer in time");
+  if (status != 0) throw Failure(FailureCode::kInternal, Describe(status));
+  return ResultOf(Split(answer));
 }

@@ -1,18 +1,24 @@
-// The steps of a login, each one request of the browser. They throw what goes wrong.
+// The steps of a login, each one request of the browser.
 #pragma once
 
 #include <string>
+#include <vector>
 
 #include "cgi.h"
+#include "failure.h"
 
-// Start sends the browser to the provider.
-void Start(const cgi::Request& request);
+// Attempt is what is known of a request while it is served: what a failure needs to say.
+struct Attempt {
+  cgi::Request request;
+  std::string reference;
+  std::string profile;
+  std::string origin;                // the page to come back to; a path of this site, or empty
+  std::vector<std::string> cookies;  // to be set with the answer
+};
 
-// Callback takes the provider's answer, signs the user in and sends the browser to the relay page.
-void Callback(const cgi::Request& request);
+// Serve serves the request. Throws what goes wrong.
+void Serve(Attempt& attempt);
 
-// Logout ends the session and sends the browser to the provider's logout.
-void Logout(const cgi::Request& request);
-
-// Fail logs what went wrong and sends the browser to the relay page with a short reason.
-void Fail(const cgi::Request& request, const std::string& text);
+// Fail logs what went wrong and sends the browser to the relay page with the failure's code and the
+// attempt's reference.
+void Fail(const Attempt& attempt, const Failure& failure);

@@ -3,28 +3,25 @@
 //   GET  ?code=...&state=...         the redirect URI: the provider's answer
 //   POST ?action=logout              ends the session here and at the provider
 #include <exception>
-#include <iostream>
-#include <stdexcept>
 
-#include "identity.h"
+#include "failure.h"
 #include "login.h"
+#include "process.h"
+#include "random.h"
 
 namespace {
 
-void Dispatch(const cgi::Request& request) {
-  const std::string action = cgi::Value(request.query, "action");
-  if (request.method == "GET" && action == "start") return Start(request);
-  if (request.method == "POST" && action == "logout") return Logout(request);
-  if (request.method == "GET" && action.empty()) return Callback(request);
-  throw std::invalid_argument("unknown request");
-}
-
-void Serve(const cgi::Request& request) {
+void Answer() {
+  Attempt attempt;
+  attempt.request = cgi::ReadRequest();  // and nothing else of the environment is left
+  process::Settle();
+  attempt.reference = Reference();
   try {
-    StepDown();
-    Dispatch(request);
+    Serve(attempt);
+  } catch (const Failure& failure) {
+    Fail(attempt, failure);
   } catch (const std::exception& error) {
-    Fail(request, error.what());
+    Fail(attempt, Failure(FailureCode::kInternal, error.what()));
   }
 }
 
@@ -32,10 +29,8 @@ void Serve(const cgi::Request& request) {
 
 int main() {
   try {
-    Serve(cgi::ReadRequest());
-  } catch (const std::exception&) {
-    // Not even the failure could be told, for want of memory: the page is static.
-    std::cout << "Status: 302 Found\nLocation: /webman/ssoclient/relay.html#success=false\n\n";
+    Answer();
+  } catch (const std::exception& error) {
+    process::EndNow("internal", error.what());
   }
-  std::cout.flush();
 }

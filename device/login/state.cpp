@@ -2,6 +2,7 @@
 
 #include <json/reader.h>
 
+#include <cctype>
 #include <exception>
 #include <memory>
 
@@ -11,6 +12,15 @@ constexpr size_t kLongestState = 1024;
 constexpr size_t kLongestOrigin = 256;
 
 const std::string kAlphabet = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
+
+// Unreserved and reserved characters, and the percent sign.
+constexpr char kURLCharacters[] =
+    "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789"
+    "-._~:/?#[]@!$&'()*+,;=%";
+
+bool IsHexDigit(char c) {
+  return std::isxdigit(static_cast<unsigned char>(c)) != 0;
+}
 
 // Empty for a text that is no base64.
 std::string DecodeBase64(const std::string& text) {
@@ -51,8 +61,13 @@ std::string Member(const Json::Value& object, const std::string& name) {
 bool IsOwnPath(const std::string& text) {
   if (text.empty() || text[0] != '/' || text.size() > kLongestOrigin) return false;
   // Not even further on: "/..//host" is "//host" once its dots are resolved.
-  if (text.substr(0, text.find('?')).find("//") != std::string::npos) return false;
-  return text.find_first_not_of(
-             "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789"
-             "/._~-?&=%") == std::string::npos;
+  if (text.substr(0, text.find_first_of("?#")).find("//") != std::string::npos) return false;
+  for (size_t i = 0; i < text.size(); ++i) {
+    if (text[i] == '%' &&
+        !(i + 2 < text.size() && IsHexDigit(text[i + 1]) && IsHexDigit(text[i + 2]))) {
+      return false;
+    }
+  }
+  // A URL holds nothing else (RFC 3986). Browsers take a backslash for a slash.
+  return text.find_first_not_of(kURLCharacters) == std::string::npos;
 }

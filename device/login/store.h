@@ -1,35 +1,41 @@
-// A folder of short-lived secrets: what the login program must remember between two requests.
+// Files of the login program below /run/ssoclient: root's, so that no other program that runs as
+// the web server's user can change them.
+//
+// All of it is short-lived and gone when the device starts again. The folder is made when it is
+// missing.
 #pragma once
 
-#include <optional>
+#include <sys/types.h>
+
 #include <string>
 
-// Store keeps small texts under random keys, each in a file of its own that only the web server's
-// user can read, until they are taken or too old.
-class Store {
+namespace store {
+
+// Folder is a folder below /run/ssoclient that root writes to; `mode` says who may read it.
+// Needs AsRoot. Throws std::runtime_error if it cannot be made, or is somebody else's.
+std::string Folder(const std::string& name, mode_t mode);
+
+// File is an open file, locked against other processes until it is closed.
+class File {
  public:
-  // `name` is a folder below /run/ssoclient, made when it is missing; texts older than `lifetime`
-  // seconds are gone; at most `capacity` are kept.
-  Store(const std::string& name, int lifetime, int capacity);
+  enum class Wait { kYes, kNo };
 
-  // NewKey returns a key that nobody can guess: 64 hexadecimal digits.
-  static std::string NewKey();
+  // Opens or makes a file that only root can read. Needs AsRoot. Throws std::runtime_error if that
+  // fails. Without waiting, Locked() says whether the lock was free.
+  File(const std::string& path, Wait wait);
+  ~File();
+  File(const File&) = delete;
+  File& operator=(const File&) = delete;
 
-  // Put keeps a text under a new key. Throws std::runtime_error if it cannot be written, or the
-  // store is full.
-  void Put(const std::string& key, const std::string& text) const;
+  bool Locked() const { return locked_; }
 
-  // Get returns the text of a key, if there is one.
-  std::optional<std::string> Get(const std::string& key) const;
-
-  // Take returns the text of a key and forgets it: of several who ask at once, one gets it.
-  std::optional<std::string> Take(const std::string& key) const;
+  // Reads or writes `size` bytes at an offset; false if that is not possible in full.
+  bool Read(void* bytes, size_t size, off_t offset) const;
+  bool Write(const void* bytes, size_t size, off_t offset) const;
 
  private:
-  std::string Path(const std::string& key) const;
-  void Sweep() const;
-
-  std::string folder_;
-  int lifetime_;
-  int capacity_;
+  int file_;
+  bool locked_;
 };
+
+}  // namespace store

@@ -3,18 +3,8 @@ import hashlib
 import re
 from pathlib import Path
 
-SOURCES = [
-    "sso/azuresso.cpp", "sso/jwt.cpp", "sso/profile.cpp", "sso/sso.cpp", "sso/utils.cpp",
-    "sso/webspheresso.cpp", "sso/internal/provider.cpp", "sso/internal/libcurl.cpp", "sso/internal/http_body.h", "sso/internal/nonce.h",
-    "sso/privilege.h", "sso/internal/split.h", "sso/common.h", "sso/sso.h", "sso/profile.h", "sso/azuresso.h",
-    "platform/encoding.c", "platform/passthrough.c",
-]
-# Headers that are mostly declarations: their constants and defaults alone are changed.
-DECLARATIONS = {"sso/common.h", "sso/sso.h", "sso/profile.h", "sso/azuresso.h"}
-
-
 class Mutant:
-    """One defect: in `path`, the lines `old` (from line number `line`) become `new`."""
+    """One defect: in `path`, the lines `old`, from number `line` on, become the lines `new`."""
 
     def __init__(self, path, line, old, new, what):
         self.path, self.line, self.old, self.new, self.what = path, line, old, new, what
@@ -23,17 +13,15 @@ class Mutant:
 
     def apply(self, text):
         lines = text.split("\n")
-        count = self.old.count("\n") + 1
-        assert "\n".join(lines[self.line - 1:self.line - 1 + count]) == self.old, self.what
-        lines[self.line - 1:self.line - 1 + count] = self.new.split("\n")
+        lines[self.line - 1:self.line - 1 + len(self.old)] = self.new
         return "\n".join(lines)
 
 
 def name_all(mutants):
-    """Names that stay when lines move: from the text, and from how often the same came before."""
+    """Names that stay when lines and files move: from the file, the text, and how often both came before."""
     seen = {}
     for mutant in mutants:
-        key = "\0".join([mutant.path, mutant.old.strip(), mutant.new.strip()])
+        key = "\0".join([mutant.path.replace("internal/", "")] + ["\n".join(part).strip() for part in (mutant.old, mutant.new)])
         seen[key] = seen.get(key, 0) + 1
         digest = hashlib.sha256((key + "\0%d" % seen[key]).encode()).hexdigest()
         mutant.name = digest[:8]
@@ -135,33 +123,54 @@ def changes(line, masked, declarations):
         yield indent + ";", "a statement dropped"
 
 
-def generate(root):
+def generate(root, sources, declarations):
+    """The defects by rule. Of headers that are mostly declarations, only constants and defaults."""
     mutants = []
-    for path in SOURCES:
+    for path in sources:
         in_comment = False
         for number, line in enumerate((Path(root) / path).read_text().split("\n"), 1):
             masked, in_comment = without_literals(line, in_comment)
             if re.match(r"\s*(#|using |namespace |static_assert|template|enum |private:|public:)", masked):
                 continue
-            for new, what in changes(line, masked, path in DECLARATIONS):
-                mutants.append(Mutant(path, number, line, new, what))
+            for new, what in changes(line, masked, path in declarations):
+                mutants.append(Mutant(path, number, [line], [new], what))
     return name_all(mutants)
 
 
-def read_by_hand(root, file):
-    """Blocks of "== PATH: DESCRIPTION [MARKS]", the lines as they are, "--", the lines instead."""
-    mutants = []
-    for block in re.split(r"^== ", Path(file).read_text(), flags=re.M)[1:]:
-        head, rest = block.split("\n", 1)
-        path, what = head.split(": ", 1)
-        marks = re.search(r" \[([\w ]+)\]$", what)
-        old, new = rest.split("\n--\n")
-        new = new.rstrip("\n")
-        text = (Path(root) / path).read_text()
-        if text.count("\n" + old + "\n") != 1:
-            raise SystemExit("%s: not found once in %s:\n%s" % (file, path, old))
-        line = text[:text.index("\n" + old + "\n") + 1].count("\n") + 1
-        mutant = Mutant(path, line, old, new, what[:marks.start()] if marks else what)
-        mutant.marks = set(marks.group(1).split()) if marks else set()
-        mutants.append(mutant)
-    return name_all(mutants)
+def words(line):
+    return " ".join(line.split())
+
+
+def places(text, old):
+    """The numbers of the lines in `text` where the lines `old` are, whatever the spaces."""
+    lines, wanted = [words(line) for line in text.split("\n")], [words(line) for line in old]
+    return [i + 1 for i in range(len(lines)) if lines[i:i + len(wanted)] == wanted]
+
+
+def read_by_hand(root, file, sources):
+    """The small patches of by-hand.diff. Returns those that fit the sources, and those that are stale."""
+    fitting, stale, path = [], [], None
+    for line in Path(file).read_text().split("\n"):
+        if line.startswith("--- "):
+            path = line[4:]
+        elif path and line.startswith("= "):
+            marks = re.search(r" \[(\w+)\]$", line)
+            mutant = Mutant(path, 0, [], [], line[2:marks.start()] if marks else line[2:])
+            mutant.marks = {marks.group(1)} if marks else set()
+            stale.append(mutant)
+        elif path and line:
+            if line[0] != "+":
+                mutant.old.append(line[1:])
+            if line[0] != "-":
+                mutant.new.append(line[1:])
+    name_all(stale)
+    texts = {source: (Path(root) / source).read_text() for source in sources}
+    for mutant in list(stale):
+        found = [(source, line) for source in sorted(texts, key=lambda s: s != mutant.path)
+                 for line in places(texts[source], mutant.old)]
+        own = [place for place in found if place[0] == mutant.path]
+        if len(own or found) == 1:
+            mutant.path, mutant.line = (own or found)[0]
+            fitting.append(mutant)
+            stale.remove(mutant)
+    return fitting, stale

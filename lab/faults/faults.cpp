@@ -18,7 +18,7 @@
 #include <cstring>
 #include <new>
 
-#include "support/busy.h"
+#include "support/support_call.h"
 
 #undef curl_easy_setopt
 
@@ -52,7 +52,7 @@ void tally(const char* name) {
 
 // Whether this call is one to fail.
 bool fails(Kind kind, const char* name) {
-  if (!armed || test::busy != 0) return false;
+  if (!armed || test::support_calls != 0) return false;
   const long count = ++counts[kind == Kind::kCall];
   tally(name);
   if (plan.nth == 0 || plan.kind != kind) return false;
@@ -82,7 +82,7 @@ bool tracked = true;
 void sweep();
 
 void* note(void* memory, const void* caller) {
-  if (!tracked || !armed || test::busy != 0 || memory == nullptr) return memory;
+  if (!tracked || !armed || test::support_calls != 0 || memory == nullptr) return memory;
   if (used > kSlots / 2) sweep();
   std::size_t slot = slotOf(memory);
   while (blocks[slot].memory != nullptr && blocks[slot].memory != kGone) slot = (slot + 1) % kSlots;

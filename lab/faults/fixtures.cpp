@@ -9,9 +9,9 @@
 #include "faults/operation.h"
 #include "support/ca.h"
 #include "support/device.h"
+#include "support/memory_file.h"
 #include "support/provider.h"
 #include "support/tokens.h"
-#include "support/unnamed_file.h"
 
 namespace faults {
 namespace {
@@ -97,7 +97,7 @@ Fixtures& fixtures() {
 }
 
 void makeFixtures() {
-  const test::UnnamedFile file;
+  const test::MemoryFile file;
   const pid_t child = fork();
   if (child == 0) {
     file.put(made().toStyledString());

@@ -30,8 +30,8 @@
 #include "faults/exports.h"
 #include "faults/lines.h"
 #include "faults/operation.h"
-#include "support/busy.h"
 #include "support/device.h"
+#include "support/support_call.h"
 
 namespace faults {
 namespace {
@@ -353,7 +353,7 @@ long mostOf(const KnownCrash& known) {
 // Notes where a process crashed, the frames of the system's and the test's own left out; the
 // process ends as it would have.
 void noteCrash(int number) {
-  const test::Busy busy;
+  const test::SupportCall support_call;
   void* frames[40];
   const int depth = backtrace(frames, 40);
   for (int i = 0; i < depth; ++i) {
@@ -560,7 +560,7 @@ void Run::armed(const std::function<void()>& call) {
       back = true;
       result = "ok";
     } catch (const std::exception& e) {
-      const test::Busy busy;
+      const test::SupportCall support_call;
       int status = 0;
       char* const name = abi::__cxa_demangle(typeid(e).name(), nullptr, nullptr, &status);
       result = std::string(name) + ": " + e.what();

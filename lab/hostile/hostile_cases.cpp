@@ -9,7 +9,7 @@
 #include <functional>
 #include <random>
 
-#include "support/bench.h"
+#include "support/token_check.h"
 
 namespace hostile {
 namespace {

@@ -20,8 +20,8 @@
 
 #include "sso/azuresso.h"
 #include "sso/sso.h"
-#include "support/bench.h"
 #include "support/hostile.h"
+#include "support/token_check.h"
 
 namespace {
 
@@ -99,7 +99,7 @@ class Hostile : public testing::Test {
     if (place == 0)
       return "{\"id_token\":\"" +
              test::rsaToken(test::anyRsaKey(), R"({"alg":"RS256","kid":"the key"})",
-                            test::kBenchBody) +
+                            test::kCheckBody) +
              "\"}";
     if (place == 1) return "{\"jwks_uri\":\"" + servers[2]->url("/keys") + "\"}";
     return "{\"keys\":[" + test::anyRsaKey().jwk("the key") + "]}";

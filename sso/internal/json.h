@@ -1,5 +1,5 @@
-// The library's way with JSON: every text, file and member goes through here. Defined in
-// utils.cpp; not exported.
+// How the library reads and writes JSON: all texts, files and members go through here. Not
+// exported.
 #pragma once
 
 #include <json/value.h>
@@ -21,7 +21,7 @@ inline bool ParseJson(const std::string& text, Json::Value& value) {
 std::string WriteJson(const Json::Value& value);
 
 // Reads and parses a whole file; false if it cannot be opened or read or is not JSON. Throws
-// for exhausted memory only.
+// only when out of memory.
 bool ReadJsonFile(const char* path, Json::Value& value);
 
 // The member `name`, or null if there is none. A value that is not an object has no members.
@@ -33,9 +33,6 @@ const Json::Value* FindString(const Json::Value& value, const char* name);
 // The member `name` as text, empty if there is none; a number is given in decimal. Throws
 // Json::LogicError for an array or an object.
 std::string MemberText(const Json::Value& value, const char* name);
-
-// Whether the value is that text, or a number or the like that reads so. Throws as MemberText does.
-bool HasText(const Json::Value& value, const std::string& text);
 
 // Assigns the member `name` to `field` if it is there and of the right type.
 void TakeSetting(const Json::Value& settings, const char* name, bool& field);

@@ -6,9 +6,7 @@
 #include <map>
 #include <sstream>
 #include <stdexcept>
-#include <utility>
 
-#include "platform/platform.h"
 #include "sso/internal/encoding.h"
 #include "sso/internal/json.h"
 #include "sso/internal/nonce.h"
@@ -23,8 +21,8 @@ namespace {
 // The parameters of a request, written in ascending order of their names.
 using ParameterSet = std::map<std::string, std::string>;
 
-void Add(ParameterSet& parameters, const char* name, std::string value) {
-  parameters.emplace(name, std::move(value));
+void Add(ParameterSet& parameters, const char* name, std::string_view value) {
+  parameters.emplace(name, value);
 }
 
 // Appends "&", name, "=" and URL-encoded value for each parameter. Names are written as they are.
@@ -45,33 +43,22 @@ std::string MakeState(const Json::Value& parameters, const std::string& nonce) {
 
 }  // namespace
 
-std::string EncodeBase64(const std::string& bytes) {
-  constexpr int kOption = 1;
-  char text[1024] = {};
-  if (QOVABase64Encode(bytes.data(), bytes.size(), text, sizeof text, kOption) == 0) {
-    throw sso_op_failed("encode base64 failed.");
-  }
-  return text;
-}
-
-std::string AuthorizationURL(const std::string& endpoint, const std::string& client_id,
-                             const std::string& redirect_uri, const char* scope,
-                             const Json::Value& parameters) {
+std::string AuthorizationURL(const AuthorizationRequest& request, const Json::Value& parameters) {
   const std::string nonce = MakeNonce();
   ParameterSet query;
   Add(query, oauth::kResponseType, "code");
-  Add(query, oauth::kScope, scope);
-  Add(query, oauth::kRedirectURI, redirect_uri);
-  Add(query, oauth::kClientID, client_id);
+  Add(query, oauth::kScope, request.scope);
+  Add(query, oauth::kRedirectURI, request.redirect_uri);
+  Add(query, oauth::kClientID, request.client_id);
   Add(query, oauth::kNonce, nonce);
   Add(query, oauth::kState, MakeState(parameters, nonce));
 
   std::string url;
-  url.reserve(endpoint.size() + 1024);
-  url += endpoint;
+  url.reserve(request.endpoint.size() + 1024);
+  url += request.endpoint;
   AppendParameters(query, url);
   // Even behind an endpoint that holds a query already.
-  url[endpoint.size()] = '?';
+  url[request.endpoint.size()] = '?';
   return url;
 }
 
@@ -80,14 +67,13 @@ void WriteRedirect(const std::string& url) {
   std::cout.write(header.data(), static_cast<std::streamsize>(header.size()));
 }
 
-std::string TokenRequestBody(const std::string& client_id, const std::string& client_secret,
-                             const std::string& redirect_uri, const std::string& code) {
+std::string TokenRequestBody(const TokenRequest& request) {
   ParameterSet parameters;
   Add(parameters, oauth::kGrantType, "authorization_code");
-  Add(parameters, oauth::kRedirectURI, redirect_uri);
-  Add(parameters, oauth::kClientID, client_id);
-  Add(parameters, oauth::kClientSecret, client_secret);
-  Add(parameters, oauth::kCode, code);
+  Add(parameters, oauth::kRedirectURI, request.redirect_uri);
+  Add(parameters, oauth::kClientID, request.client_id);
+  Add(parameters, oauth::kClientSecret, request.client_secret);
+  Add(parameters, oauth::kCode, request.code);
 
   std::string body;
   AppendParameters(parameters, body);

@@ -6,27 +6,37 @@
 #include <openssl/evp.h>
 
 #include <string>
+#include <string_view>
 
 #include "sso/common.h"
 
 namespace QOVA {
 namespace SSO {
 
-// The platform's base64 text. Throws sso_op_failed if it does not fit the platform's buffer.
-std::string EncodeBase64(const std::string& bytes);
+// The texts that a request is made of; they are the caller's.
+struct AuthorizationRequest {
+  std::string_view endpoint;
+  std::string_view client_id;
+  std::string_view redirect_uri;
+  std::string_view scope;
+};
 
 // The URL of an authorization request with a fresh nonce. Its state is made of the caller's
 // parameters and the digest of the nonce.
-std::string AuthorizationURL(const std::string& endpoint, const std::string& client_id,
-                             const std::string& redirect_uri, const char* scope,
-                             const Json::Value& parameters);
+std::string AuthorizationURL(const AuthorizationRequest& request, const Json::Value& parameters);
 
 // Ends a CGI header with a redirect to `url`: one write, not flushed.
 void WriteRedirect(const std::string& url);
 
+struct TokenRequest {
+  std::string_view client_id;
+  std::string_view client_secret;
+  std::string_view redirect_uri;
+  std::string_view code;
+};
+
 // The form-encoded body of a code exchange. The client authenticates with its secret in it.
-std::string TokenRequestBody(const std::string& client_id, const std::string& client_secret,
-                             const std::string& redirect_uri, const std::string& code);
+std::string TokenRequestBody(const TokenRequest& request);
 
 // Throws std::invalid_argument for what is not JSON.
 Json::Value ParseTokenResponse(const std::string& response);

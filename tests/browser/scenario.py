@@ -3,10 +3,14 @@
 import atexit
 import json
 import os
-import time
 
 from chromium import Chromium
-from device import EXPECTED, STORE, DeviceTest, device
+from device import EXPECTED, HERE, STORE, DeviceTest, device
+
+with open(HERE + "/../../device/www/texts.js", encoding="utf-8") as _file:
+    _text = _file.read()
+    TEXTS = json.loads(_text[_text.index("{"):_text.rindex("}") + 1])
+ENGLISH = TEXTS["en"]
 
 _chromium = None
 
@@ -38,14 +42,6 @@ class Scenario(DeviceTest):
                if not text.startswith((self.device.provider.url, self.device.stage.device +
                                        "/favicon.ico"))]
         self.assertEqual(own, [])
-
-    def change_setting(self, profile, **values):
-        path = f"/usr/qova/etc/ssoclient/{profile}.conf"
-        with open(path, encoding="ascii") as file:
-            before = json.load(file)
-        self.addCleanup(self.device.stage.configure, profile, before)
-        self.device.stage.configure(profile, {**before, **{
-            f"{profile}_{name}": value for name, value in values.items()}})
 
     # -- what the person does --------------------------------------------------------------
 
@@ -83,15 +79,15 @@ class Scenario(DeviceTest):
     def user_shown(self):
         """Who the device says is signed in, on its front page; None if nobody is."""
         self.tab.open(self.device.front_url)
-        text = self.tab.find("main").text
-        if "Nobody is signed in." in text:
-            return None
-        return self.tab.find("#user").text
+        self.tab.find("main")
+        return None if self.tab.all("#sign-in") else self.tab.find("#user").text
 
     def assert_in(self, profile, origin="/index.cgi"):
         """The relay page said so, and went on to the origin, where the person is known."""
         self.on(origin)
-        self.assertEqual(self.tab.relay()[-1]["text"].split("\n\n"), ["Signed in", "Go on"])
+        self.assertEqual(self.tab.relay()[-1]["text"].split("\n"), [
+            ENGLISH["device"], ENGLISH["signed-in"], "", ENGLISH["signed-in-text"], "",
+            ENGLISH["onward"]])
         self.assertEqual(self.tab.find("#user").text, EXPECTED[profile])
         self.assert_logged("signed in: " + EXPECTED[profile])
         self.assertEqual(len(self.sessions()), 1)
@@ -100,35 +96,39 @@ class Scenario(DeviceTest):
         """The relay page says that the person is out, and the device knows nobody."""
         self.tab.wait(lambda: self.tab.title == "Signed out", "the relay page after the logout")
         self.assertEqual(self.tab.url, self.relay_url)
-        self.assertEqual(self.tab.find("main").text.split("\n"),
-                         ["Signed out", "Back to the device"])
+        self.assertEqual(self.tab.find("main").text.split("\n"), [
+            ENGLISH["signed-out"], ENGLISH["signed-out-text"], ENGLISH["front"]])
         self.assert_nobody()
 
-    def assert_refused_here(self, reason, logged=None, lines=()):
-        """The relay page says no, with the reason as a person reads it; the log has the exact
-        text and what led to it; nobody is signed in."""
-        self.tab.wait(lambda: self.tab.title == "Not signed in", "the relay page's refusal")
-        self.assertTrue(self.tab.url.startswith(self.relay_url + "#"), self.tab.url)
-        self.assertEqual(self.tab.find("#outcome").text, "Not signed in")
-        self.assertEqual(self.tab.find("#reason").text, reason)
-        self.assertEqual(self.tab.find("#onward").text, "Back to the device")
-        for line in (*lines, "sign-in failed: " + (reason if logged is None else logged)):
+    def assert_refused_here(self, code, text, lines=()):
+        """The relay page says no in the words of that code; the log has the exact text under the
+        same reference number, and what led to it; no user is signed in."""
+        self.assert_refusal_shown(code)
+        reference = self.tab.find("#reference").text.split()[-1]
+        failures = self.logged(f"sign-in failed [{reference}]: {code}, client 127.0.0.1, ")
+        self.assertEqual(len(failures), 1, "\n".join(self.log()))
+        self.assertTrue(failures[0].endswith(": " + text), failures[0])
+        for line in lines:
             self.assert_logged(line)
         self.assertFalse([line for line in self.log() if ": signed in: " in line])
         self.assert_nobody()
+
+    def assert_refusal_shown(self, code=None, words=ENGLISH):
+        """The relay page shows the sentences of that code, or else the general ones."""
+        self.tab.wait(lambda: self.tab.title == words["not-signed-in"], "the relay page's refusal")
+        self.assertTrue(self.tab.url.startswith(self.relay_url + "#"), self.tab.url)
+        self.assertEqual(self.tab.find("#outcome").text, words["not-signed-in"])
+        reason, hint = words["failures"].get(code, words["general"])
+        self.assertEqual(self.tab.find("#reason").text, reason)
+        self.assertEqual(self.tab.find("#help").text, hint)
+        self.assertEqual(self.tab.find("#again").text, words["again"])
+        self.assertEqual(self.tab.find("#onward").text, words["front"])
 
     def assert_nobody(self):
         self.assertEqual(self.sessions(), [])
         self.assertIsNone(self.user_shown())
         names = [cookie["name"] for cookie in self.tab.driver.get_cookies()]
         self.assertNotIn("__Host-session", names)
-
-    def assert_logged(self, line):
-        """A line of the system log is that text: after the program's name, or a place in it."""
-        end = time.monotonic() + 5
-        while not any(entry.endswith((": " + line, " " + line)) for entry in self.log()):
-            if time.monotonic() > end:
-                self.fail(f"not in the log: {line}\n" + "\n".join(self.log()))
 
     @staticmethod
     def sessions():

@@ -6,15 +6,14 @@ import json
 import time
 import unittest
 
-from device import device
 from providers.scripted import Script
-from scenario import Scenario
-from servers import Lighttpd
+from scenario import ENGLISH, Scenario
 
 PROFILES = ("azure", "websphere")
-NOT_JSON = "parse json falied"
-NO_KEY = "kid does not exist in Azure verified kyes"
-NO_TOKEN = "we cannot find key 'id_token' in response!"
+NOT_JSON = "provider-error", "parse json falied"
+NO_ANSWER = "unreachable", "parse json falied"
+NO_KEY = "not-verified", "kid does not exist in Azure verified kyes"
+NO_TOKEN = "provider-error", "we cannot find key 'id_token' in response!"
 HTML = "<!DOCTYPE html><html><body><h1>Down for maintenance</h1></body></html>"
 DEADLINE = 3
 
@@ -36,51 +35,51 @@ def answers_html(path):
 
 
 class Refusals(Scenario):
-    """One bad answer each. Beside the profile: what the provider does, the reason on the relay
-    page, and the lines that lead to it in the log."""
+    """One bad answer each. Beside the profile: what the provider does, the code of the failure,
+    its text in the log, and the lines there that lead to it."""
 
     TABLE = {
         "refused_at_the_provider": (
             PROFILES, Script(refuse={"error": "access_denied"}),
-            "provider refused: access_denied"),
-        "audience_of_another_client": (PROFILES, claim("aud", "other-client"), "client ID invalid"),
-        "tenant_of_somebody_else": (("azure",), claim("tid", "tenant-8"), "tenant ID invalid"),
-        "expired": (PROFILES, claim("exp", int(time.time()) - 5), "id_token expired."),
+            "denied", "provider refused"),
+        "audience_of_another_client": (PROFILES, claim("aud", "other-client"), "not-verified", "client ID invalid"),
+        "tenant_of_somebody_else": (("azure",), claim("tid", "tenant-8"), "not-verified", "tenant ID invalid"),
+        "expired": (PROFILES, claim("exp", int(time.time()) - 5), "not-verified", "id_token expired."),
         "algorithm_none": (
             PROFILES, Script(header=lambda given: {**given, "alg": "none"}, sign=lambda _: b""),
-            "none algorithm is not supported"),
+            "not-verified", "none algorithm is not supported"),
         "rsa_for_websphere": (("websphere",), header(alg="RS256"),
-                              "RS256 algorithm is not supported"),
+                              "not-verified", "RS256 algorithm is not supported"),
         "hmac_without_key_identity_for_azure": (
-            ("azure",), Script(header=lambda _: {"alg": "HS256"}), NO_KEY),
+            ("azure",), Script(header=lambda _: {"alg": "HS256"}), *NO_KEY),
         "altered_signature": (("azure",), Script(signature=lambda made: bytes([made[0] ^ 1]) +
                                                  made[1:]),
-                              "verify rsa signature failed", "EVP_DigestVerifyFinal failed"),
+                              "not-verified", "verify rsa signature failed", "EVP_DigestVerifyFinal failed"),
         "altered_hmac": (("websphere",), Script(signature=lambda made: bytes([made[0] ^ 1]) +
                                                 made[1:]),
-                         "verify hmac signature failed"),
+                         "not-verified", "verify hmac signature failed"),
         "nonce_of_another_login": (PROFILES, claim("nonce", "other"),
-                                   "nonce does not belong to this login"),
-        "html_from_the_token_endpoint": (PROFILES, answers_html("token"), NOT_JSON),
+                                   "not-verified", "nonce does not belong to this login"),
+        "html_from_the_token_endpoint": (PROFILES, answers_html("token"), *NOT_JSON),
         "html_for_the_discovery_document": (
-            ("azure",), answers_html("wellknown"), NO_KEY, "bad wellknown json format."),
+            ("azure",), answers_html("wellknown"), *NO_KEY, "bad wellknown json format."),
         "html_for_the_key_set": (
-            ("azure",), answers_html("keys"), NO_KEY,
+            ("azure",), answers_html("keys"), *NO_KEY,
             "request wellknown uri bad wellknown json format.."),
-        "token_answer_cut_off": (PROFILES, Script(cut=("token",)), NOT_JSON,
+        "token_answer_cut_off": (PROFILES, Script(cut=("token",)), *NOT_JSON,
                                  "request token uri Transferred a partial file."),
-        "discovery_document_cut_off": (("azure",), Script(cut=("wellknown",)), NO_KEY,
+        "discovery_document_cut_off": (("azure",), Script(cut=("wellknown",)), *NO_KEY,
                                        "Transferred a partial file"),
-        "key_set_cut_off": (("azure",), Script(cut=("keys",)), NO_KEY,
+        "key_set_cut_off": (("azure",), Script(cut=("keys",)), *NO_KEY,
                             "request wellknown uri Transferred a partial file."),
     }
 
-    def refused(self, profile, script, reason, *lines):
+    def refused(self, profile, script, code, text, *lines):
         self.device.provider.script = script
         self.to_provider(profile)
         if script.refuse is None:
             self.enter()
-        self.assert_refused_here(reason, lines=lines)
+        self.assert_refused_here(code, text, lines)
 
 
 def _add(name, profile, row):
@@ -97,25 +96,25 @@ class Secrets(Scenario):
     """Device and provider do not agree on a secret or a key."""
 
     def test_wrong_client_secret_azure(self):
-        self.change_setting("azure", client_secret="another")
+        self.change("azure", client_secret="another")
         self.sign_in("azure")
-        self.assert_refused_here("invalid_client", '{"error":"invalid_client"}')
+        self.assert_refused_here("provider-error", '{"error":"invalid_client"}')
 
     def test_wrong_client_secret_websphere(self):
-        self.change_setting("websphere", client_secret="another")
+        self.change("websphere", client_secret="another")
         self.sign_in("websphere")
-        self.assert_refused_here(NO_TOKEN)
+        self.assert_refused_here(*NO_TOKEN)
 
     def test_wrong_tenant_in_the_settings(self):
-        self.change_setting("azure", tenant_id="tenant-8")
+        self.change("azure", tenant_id="tenant-8")
         self.sign_in("azure")
-        self.assert_refused_here("tenant ID invalid")
+        self.assert_refused_here("not-verified", "tenant ID invalid")
 
     def test_signed_under_another_secret(self):
         self.device.provider.script = Script(
             sign=lambda data: hmac.new(b"guessed", data, hashlib.sha256).digest())
         self.sign_in("websphere")
-        self.assert_refused_here("verify hmac signature failed")
+        self.assert_refused_here("not-verified", "verify hmac signature failed")
 
     def test_hmac_under_the_published_key(self):
         """The forger takes what everybody can read as the secret of an HMAC."""
@@ -124,7 +123,7 @@ class Secrets(Scenario):
             header=lambda given: {**given, "alg": "HS256"},
             sign=lambda data: hmac.new(published, data, hashlib.sha256).digest())
         self.sign_in("azure")
-        self.assert_refused_here("HS256 algorithm is not supported")
+        self.assert_refused_here("not-verified", "HS256 algorithm is not supported")
 
     def test_key_rotated_between_two_logins(self):
         self.sign_in("azure")
@@ -141,14 +140,14 @@ class Secrets(Scenario):
         self.device.provider.script = Script(header=lambda given: {**given, "kid": "key-1"},
                                              sign=before)
         self.sign_in("azure")
-        self.assert_refused_here(NO_KEY)
+        self.assert_refused_here(*NO_KEY)
 
     def test_another_key_under_the_same_name(self):
         before = self.device.provider.signer("azure")
         self.device.provider.rotate("key-1")
         self.device.provider.script = Script(sign=before)
         self.sign_in("azure")
-        self.assert_refused_here("verify rsa signature failed",
+        self.assert_refused_here("not-verified", "verify rsa signature failed",
                                  lines=("EVP_DigestVerifyFinal failed",))
 
 
@@ -167,13 +166,13 @@ class Unreachable(Scenario):
         self.addCleanup(self.device.provider.start)
         self.device.provider.script = Script(leave=True)
         self.sign_in("azure")
-        self.assert_refused_here(NOT_JSON,
+        self.assert_refused_here(*NO_ANSWER,
                                  lines=("request token uri Couldn't connect to server.",))
 
     def test_unknown_name(self):
-        self.change_setting("websphere", token_endpoint="https://nowhere.invalid/token")
+        self.change("websphere", token_endpoint="https://nowhere.invalid/token")
         self.sign_in("websphere")
-        self.assert_refused_here(NOT_JSON,
+        self.assert_refused_here(*NO_ANSWER,
                                  lines=("request token uri Couldn't resolve host name.",))
 
     def second_door(self, certificate):
@@ -191,31 +190,31 @@ class Unreachable(Scenario):
         door = self.second_door(stage.unknown_certificate(stage.provider_name))
         for profile in PROFILES:
             with self.subTest(profile=profile):
-                self.change_setting(profile, token_endpoint=f"{door}/{profile}/token")
+                self.change(profile, token_endpoint=f"{door}/{profile}/token")
                 self.device.provider.seen.clear()
                 self.sign_in(profile)
-                self.assert_refused_here(NOT_JSON, lines=(f"request token uri {self.WRONG}.",))
+                self.assert_refused_here(*NO_ANSWER, lines=(f"request token uri {self.WRONG}.",))
                 self.assertFalse([path for _, path, _, _ in self.device.provider.seen
                                   if path.endswith("/token")], "the code went to a stranger")
 
     def test_token_endpoint_with_a_certificate_for_another_name(self):
         door = self.second_door(self.device.stage.device_certificate)
-        self.change_setting("websphere", token_endpoint=door + "/websphere/token")
+        self.change("websphere", token_endpoint=door + "/websphere/token")
         self.sign_in("websphere")
-        self.assert_refused_here(NOT_JSON, lines=(f"request token uri {self.WRONG}.",))
+        self.assert_refused_here(*NO_ANSWER, lines=(f"request token uri {self.WRONG}.",))
 
     def test_keys_from_an_unknown_certificate(self):
         stage = self.device.stage
         door = self.second_door(stage.unknown_certificate(stage.provider_name))
-        self.change_setting("azure", wellknown=door + "/azure/wellknown")
+        self.change("azure", wellknown=door + "/azure/wellknown")
         self.sign_in("azure")
-        self.assert_refused_here(NO_KEY, lines=(self.WRONG,))
+        self.assert_refused_here(*NO_KEY, lines=(self.WRONG,))
 
     def test_login_page_with_an_unknown_certificate(self):
         """Here it is the browser that warns, before a password is typed."""
         stage = self.device.stage
         door = self.second_door(stage.unknown_certificate(stage.provider_name))
-        self.change_setting("azure", authorization_endpoint=door + "/azure/authorization")
+        self.change("azure", authorization_endpoint=door + "/azure/authorization")
         self.to_provider("azure")
         self.tab.wait(lambda: "ERR_CERT_AUTHORITY_INVALID" in self.tab.text,
                       "the browser's warning")
@@ -226,20 +225,21 @@ class Unreachable(Scenario):
 class Silent(Scenario):
     """A provider that takes the request and never answers: the device gives up."""
 
-    @classmethod
-    def setUpClass(cls):
-        device().use(Lighttpd, SSO_LOGIN_DEADLINE=str(DEADLINE))
-
-    @classmethod
-    def tearDownClass(cls):
-        device().use(Lighttpd)
+    def setUp(self):
+        super().setUp()
+        self.device.options(deadline=DEADLINE)
 
     def given_up(self, profile, path):
         self.device.provider.script = Script(silent=(path,))
         begun = time.monotonic()
         self.sign_in(profile)
-        self.assert_refused_here("provider did not answer in time")
+        self.assert_refused_here("timeout", "provider did not answer in time")
         self.assertGreater(time.monotonic() - begun, DEADLINE)
+        shown, = self.tab.waited()
+        self.assertEqual(shown["text"].split("\n\n"), [
+            ENGLISH["device"] + "\n" + ENGLISH["waiting"], ENGLISH["waiting-text"],
+            ENGLISH["waiting-link"]])
+        self.assertGreater(shown["seconds"], DEADLINE - 0.5)
 
     def test_token_endpoint(self):
         self.given_up("websphere", "token")

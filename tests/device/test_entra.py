@@ -458,8 +458,7 @@ class EntraSignIns(SignIns):
             with self.subTest(title=title):
                 self.device.register(title)
                 self.assert_signed_in(self.sign_in(), "azure")
-                page = self.browser.post(self.device.login_url + "?action=logout", {})
-                page = self.browser.get(page.location)
+                page = self.browser.get(self.sign_out().location)
                 self.assertEqual(page.location, self.device.stage.device +
                                  "/webman/ssoclient/relay.html")
                 page = self.browser.get(self.start().location)
@@ -487,7 +486,8 @@ class EntraSignIns(SignIns):
         page = self.twin.sign_in(self.browser, page)
         there = urllib.parse.urljoin(page.url, page.form("consent")["action"])
         back = self.browser.post(there, {"consent": "cancel"}).location
-        self.assert_refused(self.browser.get(back), "provider refused: access_denied")
+        self.assert_refused(self.browser.get(back), "denied", "provider refused",
+                            ", error access_denied, error_description AADSTS65004: ")
 
     def test_guest_with_the_stored_name(self):
         """The device makes its name of the two parts around the @ of the stored name."""

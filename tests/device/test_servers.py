@@ -8,8 +8,8 @@ from servers import Apache, Busybox, Lighttpd, Nginx
 
 
 class OnServer:
-    """What every web server must carry: redirects, two cookies in one answer, a POST, the
-    program's environment, and the static relay page."""
+    """What every web server must carry: redirects, two cookies in one answer, a form, the request's
+    own variables, and the static relay page."""
     server = None
 
     @classmethod
@@ -25,7 +25,7 @@ class OnServer:
             with self.subTest(profile=profile):
                 self.device.choose(profile)
                 self.assert_signed_in(self.sign_in(), profile)
-                page = self.browser.post(self.device.login_url + "?action=logout", {})
+                page = self.sign_out()
                 self.assertTrue(page.location.startswith(
                     f"{self.device.provider.url}/{profile}/logout"), page.location)
                 self.assertIsNone(self.user())
@@ -40,25 +40,27 @@ class OnServer:
         self.assertEqual(page.body.strip(), "")
 
     def test_refuses(self):
+        """The server passes the client's address on."""
         other = self.new_browser()
-        self.assert_refused(other.get(self.callback_url()),
+        self.assert_refused(other.get(self.callback_url()), "expired",
                             "login was not started in this browser, or is used up", browser=other)
 
-    def test_reason_with_markup(self):
+    def test_form_of_another_site(self):
+        """The server passes on what the browser says of a form's page."""
+        self.sign_in()
+        for headers in ({"Sec-Fetch-Site": "cross-site"}, {"Origin": "https://other.example.org"}):
+            self.reference(self.sign_out(headers=headers), "sign-out-refused")
+            self.assertEqual(self.user(), "alice")
+
+    def test_error_with_markup(self):
         self.device.provider.script = Script(refuse={"error": "<b>&%25\"'#"})
-        self.assert_refused(self.sign_in(), "provider refused: <b>&%25\"'#")
+        self.assert_refused(self.sign_in(), "provider-error", "provider refused",
+                            ", error <b>&%25\"'#: ")
 
-    def test_deadline_from_the_environment(self):
-        self.addCleanup(self.device.use, self.server)
-        self.device.use(self.server, SSO_LOGIN_DEADLINE="1")
+    def test_deadline(self):
+        self.device.options(deadline=1)
         self.device.provider.script = Script(silent=("token",))
-        self.assert_refused(self.sign_in(), "provider did not answer in time")
-
-    def test_plain_road_from_the_environment(self):
-        self.addCleanup(self.device.use, self.server)
-        self.device.use(self.server, SSO_LOGIN_ROAD="plain")
-        self.device.provider.script = Script(claims=lambda claims: {**claims, "nonce": "other"})
-        self.assert_signed_in(self.sign_in(), "websphere")
+        self.assert_refused(self.sign_in(), "timeout", "provider did not answer in time")
 
     def test_relay_page(self):
         page = self.browser.get(self.device.stage.device + "/webman/ssoclient/relay.html")

@@ -21,8 +21,8 @@
 #include "sso/profile.h"
 #include "sso/sso.h"
 #include "support/log.h"
+#include "support/memory_file.h"
 #include "support/tokens.h"
-#include "support/unnamed_file.h"
 
 namespace test {
 namespace {
@@ -229,9 +229,9 @@ Outcome runDoctor(const Site& site, bool text) {
   if (!text) arguments.push_back("--json");
   if (site.passToken) arguments.push_back("--token");
   arguments.insert(arguments.end(), site.arguments.begin(), site.arguments.end());
-  const UnnamedFile in;
-  const UnnamedFile out;
-  const UnnamedFile err;
+  const MemoryFile in;
+  const MemoryFile out;
+  const MemoryFile err;
   if (site.passToken) in.put(site.idToken() + "\n");
   lseek(in.descriptor(), 0, SEEK_SET);  // for the tool to read from the start
   std::optional<Terminal> terminal;

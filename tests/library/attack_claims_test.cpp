@@ -9,9 +9,9 @@
 #include <string>
 #include <vector>
 
-#include "support/bench.h"
 #include "support/clock.h"
-#include "support/moment.h"
+#include "support/processor_time.h"
+#include "support/token_check.h"
 
 namespace {
 
@@ -21,7 +21,7 @@ const char kBadHeader[] = "bad jwt header format!";
 const char kBadBody[] = "bad jwt body format!";
 
 template <typename Provider>
-class AttackClaims : public test::Bench<Provider> {
+class AttackClaims : public test::TokenCheck<Provider> {
  protected:
   static std::string withBody(const std::string& body) {
     return AttackClaims::token(AttackClaims::goodHeader(), body);
@@ -31,7 +31,7 @@ class AttackClaims : public test::Bench<Provider> {
   }
   // A body that is right but for its end.
   static std::string open() {
-    const std::string body = test::kBenchBody;
+    const std::string body = test::kCheckBody;
     return body.substr(0, body.size() - 1);
   }
   static std::string nameOf(const std::string& token) {
@@ -78,7 +78,7 @@ TYPED_TEST(AttackClaims, DoNotEndAtAZeroByteWhenTheyAreCompared) {
 // stands before it has to be whole.
 TYPED_TEST(AttackClaims, EndAtAZeroByteOfTheSegment) {
   const std::string zero(1, '\0');
-  const std::string good = test::kBenchBody;
+  const std::string good = test::kCheckBody;
   EXPECT_TRUE(this->accepts(this->withBody(good + zero)));
   EXPECT_TRUE(this->accepts(this->withBody(good + zero + R"(,"exp":1})")));
   EXPECT_TRUE(this->invalid(kBadBody, this->withBody(zero + good)));
@@ -103,7 +103,7 @@ TYPED_TEST(AttackClaims, EndAtAZeroByteOfTheSegment) {
 // Segments are C strings too: the text behind a zero byte in the token is not part of them.
 TYPED_TEST(AttackClaims, EndAtAZeroByteOfTheToken) {
   const std::string zero(1, '\0');
-  const std::string good = this->withBody(test::kBenchBody);
+  const std::string good = this->withBody(test::kCheckBody);
   const size_t dot = good.rfind('.');
   const size_t first = good.find('.');
   EXPECT_TRUE(this->accepts(good + zero + "behind"));
@@ -255,7 +255,7 @@ TYPED_TEST(AttackClaims, MayBeHuge) {
   for (int i = 0; i < 50000; ++i) items += ",0";
   taken(this->withBody(this->open() + ",\"x\":[" + items + "]}"));
   taken(this->withBody(this->open() + std::string(1 << 20, ' ') + "}"));
-  taken(this->withBody("/*" + big + "*/" + test::kBenchBody));
+  taken(this->withBody("/*" + big + "*/" + test::kCheckBody));
 }
 
 TYPED_TEST(AttackClaims, MayBeHugeAndBeRefusedAsSoon) {
@@ -270,7 +270,7 @@ TYPED_TEST(AttackClaims, MayBeHugeAndBeRefusedAsSoon) {
   soon([&] { EXPECT_TRUE(this->invalid(kExpired, late)); });
   const std::string other = this->withBody(this->open() + ",\"aud\":\"" + big + "\"}");
   soon([&] { EXPECT_TRUE(this->invalid(kWrongClient, other)); });
-  const std::string behind = this->withBody(test::kBenchBody) + big;
+  const std::string behind = this->withBody(test::kCheckBody) + big;
   soon([&] { EXPECT_TRUE(this->doubts(behind)); });
   const std::string dots(1 << 20, '.');
   soon([&] { EXPECT_TRUE(this->invalid("bad jwt format!", dots)); });
@@ -309,7 +309,7 @@ TYPED_TEST(AttackClaims, HoldNoHalfOfASurrogatePair) {
 // The signature covers the text of the segments, not what they decode to.
 TYPED_TEST(AttackClaims, AreSignedInTheirOneSpelling) {
   const std::string good =
-      this->token(this->goodHeader() + " ", std::string(test::kBenchBody) + " ");
+      this->token(this->goodHeader() + " ", std::string(test::kCheckBody) + " ");
   const size_t first = good.find('.');
   const size_t second = good.rfind('.');
   const std::string header = good.substr(0, first);
@@ -339,7 +339,7 @@ TYPED_TEST(AttackClaims, AreSignedInTheirOneSpelling) {
 
 // A text of 4k + 1 characters stands for nothing, and neither do characters outside the alphabet.
 TYPED_TEST(AttackClaims, AreNotReadFromWhatIsNoBase64) {
-  const std::string body = test::base64url(test::kBenchBody);
+  const std::string body = test::base64url(test::kCheckBody);
   const std::string header = test::base64url(this->goodHeader());
   for (const char* odd :
        {"A", "AAAAA", "e30AA", "!", "%65%33%30", "e3 0", "====", "=e30", "\xff\xff"}) {

@@ -6,8 +6,8 @@
 #include <vector>
 
 #include "sso/jwt.h"
-#include "support/bench.h"
 #include "support/provider.h"
+#include "support/token_check.h"
 
 namespace {
 
@@ -16,11 +16,11 @@ using test::anyRsaKey;
 using test::base64url;
 
 template <typename Provider>
-class AttackHeader : public test::Bench<Provider> {};
+class AttackHeader : public test::TokenCheck<Provider> {};
 TYPED_TEST_SUITE(AttackHeader, test::Clients, test::ClientName);
 
-using AttackAzureHeader = test::Bench<test::Azure>;
-using AttackWebSphereHeader = test::Bench<test::WebSphere>;
+using AttackAzureHeader = test::TokenCheck<test::Azure>;
+using AttackWebSphereHeader = test::TokenCheck<test::WebSphere>;
 
 std::string quoted(const std::string& text) {
   return Json::Value(text).toStyledString();
@@ -125,7 +125,7 @@ TYPED_TEST(AttackHeader, DoesNotMakeATokenWithoutASignatureGood) {
     }
     EXPECT_TRUE(this->doubts(forged)) << signature;
   }
-  const std::string none = test::signingInput(this->header("none"), test::kBenchBody);
+  const std::string none = test::signingInput(this->header("none"), test::kCheckBody);
   for (const std::string& signature : {std::string(), good.substr(good.rfind('.') + 1)}) {
     EXPECT_TRUE(this->template refuses<jwt_not_support>("none algorithm is not supported",
                                                         none + "." + signature));
@@ -146,7 +146,7 @@ TYPED_TEST(AttackHeader, BringsNoKeyOfItsOwn) {
         std::string("\"crit\":[\"exp\"],\"exp\":1"), std::string("\"b64\":false"),
         std::string("\"zip\":\"DEF\""), std::string("\"enc\":\"A128GCM\"")}) {
     const std::string header = start + "," + extra + "}";
-    EXPECT_TRUE(this->doubts(test::rsaToken(own, header, test::kBenchBody))) << extra;
+    EXPECT_TRUE(this->doubts(test::rsaToken(own, header, test::kCheckBody))) << extra;
     EXPECT_TRUE(this->accepts(this->token(header))) << extra;
   }
   EXPECT_TRUE(attacker.requests().empty());
@@ -168,9 +168,9 @@ TEST_F(AttackAzureHeader, GetsNoMacUnderThePublicKeyAccepted) {
       const std::string hs = std::string("HS") + digest;
       EXPECT_TRUE(
           refuses<jwt_not_support>(hs + " algorithm is not supported",
-                                   test::hmacToken(secret, header(hs), test::kBenchBody, hs)));
+                                   test::hmacToken(secret, header(hs), test::kCheckBody, hs)));
       EXPECT_TRUE(doubts(
-          test::hmacToken(secret, header(std::string("RS") + digest), test::kBenchBody, hs)));
+          test::hmacToken(secret, header(std::string("RS") + digest), test::kCheckBody, hs)));
     }
   }
 }
@@ -180,28 +180,28 @@ TEST_F(AttackWebSphereHeader, GetsNoRsaSignatureAccepted) {
     const std::string rs = std::string("RS") + digest;
     EXPECT_TRUE(
         refuses<jwt_not_support>(rs + " algorithm is not supported",
-                                 test::rsaToken(anyRsaKey(), header(rs), test::kBenchBody, rs)));
+                                 test::rsaToken(anyRsaKey(), header(rs), test::kCheckBody, rs)));
     EXPECT_TRUE(doubts(
-        test::rsaToken(anyRsaKey(), header(std::string("HS") + digest), test::kBenchBody, rs)));
+        test::rsaToken(anyRsaKey(), header(std::string("HS") + digest), test::kCheckBody, rs)));
   }
 }
 
 TEST_F(AttackWebSphereHeader, GetsNoMacUnderAnotherTextOfTheSecretAccepted) {
-  const std::string secret = test::kBenchSecret;
+  const std::string secret = test::kCheckSecret;
   for (const std::string& other :
        {std::string(), test::base64(secret), base64url(secret), secret + '\n', ' ' + secret,
         std::string("the device"), std::string("null")})
-    EXPECT_TRUE(doubts(test::hmacToken(other, goodHeader(), test::kBenchBody)))
+    EXPECT_TRUE(doubts(test::hmacToken(other, goodHeader(), test::kCheckBody)))
         << testing::PrintToString(other);
   // RFC 2104 fills a short key with zero bytes: here the two are one key, whoever writes them.
   for (const size_t zeros : {1u, 2u, 44u})
     EXPECT_TRUE(accepts(
-        test::hmacToken(secret + std::string(zeros, '\0'), goodHeader(), test::kBenchBody)));
+        test::hmacToken(secret + std::string(zeros, '\0'), goodHeader(), test::kCheckBody)));
 }
 
 // A key of no bytes, or one the platform cannot hand on, is not the empty key.
 TEST_F(AttackWebSphereHeader, FindsNoEmptyKeyBehindABadSecret) {
-  const std::string forged = test::hmacToken("", goodHeader(), test::kBenchBody);
+  const std::string forged = test::hmacToken("", goodHeader(), test::kCheckBody);
   for (const Json::Value& secret :
        {Json::Value(""), Json::Value(), Json::Value(0), Json::Value(false),
         Json::Value(Json::arrayValue), Json::Value(std::string("\0", 1))}) {
@@ -283,7 +283,7 @@ TEST_F(AttackWebSphereHeader, ReachesNoKeyTextOfPads) {
   const auto isKey = [&](const std::string& secret, const std::string& key) {
     settings["client_secret"] = secret;
     test::configure<test::WebSphere>(settings);
-    const std::string token = test::hmacToken(key, goodHeader(), test::kBenchBody);
+    const std::string token = test::hmacToken(key, goodHeader(), test::kCheckBody);
     const bool taken = accepts(token);
     EXPECT_NE(taken, static_cast<bool>(doubts(token))) << secret;
     return taken;

@@ -13,8 +13,8 @@
 #include <vector>
 
 #include "sso/jwt.h"
-#include "support/bench.h"
-#include "support/moment.h"
+#include "support/processor_time.h"
+#include "support/token_check.h"
 
 namespace {
 
@@ -319,7 +319,7 @@ TEST_F(AttackPadding, HasOneForm) {
   }
 }
 
-class AttackCut : public test::Bench<test::Azure> {
+class AttackCut : public test::TokenCheck<test::Azure> {
  protected:
   static std::string keySet() { return "{\"keys\":[" + anyRsaKey().jwk("the key") + "]}"; }
 };
@@ -352,7 +352,7 @@ TEST_F(AttackCut, DiscoveryDocumentsCountAsFarAsTheyCame) {
 }
 
 template <typename Provider>
-class AttackCutToken : public test::Bench<Provider> {};
+class AttackCutToken : public test::TokenCheck<Provider> {};
 TYPED_TEST_SUITE(AttackCutToken, test::Clients, test::ClientName);
 
 TYPED_TEST(AttackCutToken, ResponsesHoldNoTokenWhereverTheyEnd) {

@@ -10,9 +10,9 @@
 #include "sso/profile.h"
 #include "sso/sso.h"
 #include "sso/utils.h"
-#include "support/bench.h"
 #include "support/provider.h"
 #include "support/query.h"
+#include "support/token_check.h"
 
 namespace {
 
@@ -29,7 +29,7 @@ bool holdsBreak(const std::string& text) {
 }
 
 template <typename Provider>
-class AttackLines : public test::Bench<Provider> {
+class AttackLines : public test::TokenCheck<Provider> {
  protected:
   using Client = typename Provider::Client;
 
@@ -324,9 +324,9 @@ TEST_F(AttackWebSphereLines, SecretsUpToTheBorderAreUsedWhole) {
     secret.back() = '!';
     settings["client_secret"] = secret;
     test::configure<test::WebSphere>(settings);
-    const std::string right = test::hmacToken(secret, goodHeader(), test::kBenchBody);
+    const std::string right = test::hmacToken(secret, goodHeader(), test::kCheckBody);
     const std::string shorter =
-        test::hmacToken(secret.substr(0, size - 1), goodHeader(), test::kBenchBody);
+        test::hmacToken(secret.substr(0, size - 1), goodHeader(), test::kCheckBody);
     if (size <= 765) {
       EXPECT_TRUE(accepts(right)) << size;
       EXPECT_TRUE(doubts(shorter)) << size;

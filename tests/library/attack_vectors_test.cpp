@@ -16,8 +16,8 @@
 #include <vector>
 
 #include "sso/jwt.h"
-#include "support/bench.h"
 #include "support/clock.h"
+#include "support/token_check.h"
 
 namespace {
 
@@ -423,8 +423,8 @@ TEST(ExamplesOfRfc7520, WithAnotherPaddingAreRefused) {
 // neither tenant nor audience, and expired in 2011, so that the clock stands still there.
 const std::time_t kJoesExpiry = 1300819380;
 
-using ExamplesForAzure = test::Bench<test::Azure>;
-using ExamplesForWebSphere = test::Bench<test::WebSphere>;
+using ExamplesForAzure = test::TokenCheck<test::Azure>;
+using ExamplesForWebSphere = test::TokenCheck<test::WebSphere>;
 
 TEST_F(ExamplesForWebSphere, OfRfc7515PassUntilTheyExpire) {
   const std::string secret = test::fromBase64(
@@ -467,7 +467,7 @@ TEST_F(ExamplesForAzure, OfRfc7515PassUntilTheyExpire) {
 
 // Those of other algorithms. Those whose claims expired say so first, and one payload is no JSON.
 template <typename Provider>
-class ExamplesForBoth : public test::Bench<Provider> {};
+class ExamplesForBoth : public test::TokenCheck<Provider> {};
 TYPED_TEST_SUITE(ExamplesForBoth, test::Clients, test::ClientName);
 
 TYPED_TEST(ExamplesForBoth, OfOtherAlgorithmsAreNotSupported) {

@@ -28,18 +28,18 @@ class AzureKeys : public testing::Test {
  protected:
   // Whether libcurl was told to verify the server, and was cleaned up twice: once by the transfer,
   // once more behind it.
-  static void ExpectCalls(const test::CurlSpy& spy, bool transfer = true) {
+  static void expectCalls(const test::CurlSpy& spy, bool transfer = true) {
     std::vector<std::string> expected = {"global_init 3", "easy_init"};
     if (transfer) {
-      expected.insert(expected.end(),
-                      {"setopt 10002", "setopt 20011", "setopt 10001", "perform", "easy_cleanup"});
+      expected.insert(expected.end(), {"setopt URL", "setopt WRITEFUNCTION", "setopt WRITEDATA",
+                                       "perform", "easy_cleanup"});
     }
     expected.insert(expected.end(), {"global_cleanup", "global_cleanup"});
     EXPECT_EQ(spy.calls, expected);
   }
 
   // A key set that cannot be used is null, or has no "keys".
-  static bool IsEmpty(const Json::Value& keys) {
+  static bool isEmpty(const Json::Value& keys) {
     return keys.isNull() || !keys.isObject() || !keys.isMember("keys");
   }
 
@@ -59,7 +59,7 @@ TEST_F(AzureKeys, AreTheDocumentAtTheAddress) {
   EXPECT_EQ(keys["more"], 1);
   EXPECT_EQ(keys.getComment(Json::commentBefore), "/* why */");
   EXPECT_TRUE(log.isEmpty());
-  ExpectCalls(spy);
+  expectCalls(spy);
 }
 
 TEST_F(AzureKeys, AreNotTakenFromAServerThatCannotBeTrusted) {
@@ -67,12 +67,12 @@ TEST_F(AzureKeys, AreNotTakenFromAServerThatCannotBeTrusted) {
   provider.answer("/keys", test::ok(R"({"keys":[]})")).start();
   test::CurlSpy spy;
   client.RequestKeysInfo(provider.url("/keys"), keys);
-  EXPECT_TRUE(IsEmpty(keys));
+  EXPECT_TRUE(isEmpty(keys));
   EXPECT_TRUE(provider.requests().empty());
   EXPECT_TRUE(log.is({{LOG_ERR, "azuresso.cpp",
                        std::string("request wellknown uri ") +
                            curl_easy_strerror(CURLE_PEER_FAILED_VERIFICATION) + "."}}));
-  ExpectCalls(spy);
+  expectCalls(spy);
 }
 
 TEST_F(AzureKeys, AreMissingWithALineForEachFailureOfTheTransfer) {
@@ -82,10 +82,10 @@ TEST_F(AzureKeys, AreMissingWithALineForEachFailureOfTheTransfer) {
     test::CurlSpy spy;
     spy.onPerform = [code](CURL*) { return code; };
     client.RequestKeysInfo(kAddress, keys);
-    EXPECT_TRUE(IsEmpty(keys));
+    EXPECT_TRUE(isEmpty(keys));
     EXPECT_TRUE(log.is({{LOG_ERR, "azuresso.cpp",
                          std::string("request wellknown uri ") + curl_easy_strerror(code) + "."}}));
-    ExpectCalls(spy);
+    expectCalls(spy);
   }
 }
 
@@ -93,12 +93,12 @@ TEST_F(AzureKeys, AreMissingWithoutATransferHandle) {
   test::CurlSpy spy;
   spy.noHandle = true;
   client.RequestKeysInfo(kAddress, keys);
-  EXPECT_TRUE(IsEmpty(keys));
+  EXPECT_TRUE(isEmpty(keys));
   ASSERT_EQ(log.lines().size(), 1u);
   EXPECT_TRUE(
       log.is({{LOG_ERR, "azuresso.cpp",
                std::string("curl_easy_init failed. ") + std::strerror(log.lines()[0].error)}}));
-  ExpectCalls(spy, false);
+  expectCalls(spy, false);
 }
 
 struct Thrown {
@@ -119,9 +119,9 @@ TEST_F(AzureKeys, AreMissingAfterTheThreeExceptionsThatEndHere) {
       return CURLE_OK;
     };
     client.RequestKeysInfo(kAddress, keys);
-    EXPECT_TRUE(IsEmpty(keys));
+    EXPECT_TRUE(isEmpty(keys));
     EXPECT_TRUE(log.is({{LOG_ERR, "azuresso.cpp", c.line}})) << c.name;
-    ExpectCalls(spy);
+    expectCalls(spy);
   }
   log.clear();
   test::CurlSpy spy;
@@ -130,7 +130,7 @@ TEST_F(AzureKeys, AreMissingAfterTheThreeExceptionsThatEndHere) {
   ASSERT_EQ(log.lines().size(), 1u);
   EXPECT_EQ(log.lines()[0].priority, LOG_ERR);
   EXPECT_NE(log.lines()[0].text.find(" curl_easy_init failed. "), std::string::npos);
-  ExpectCalls(spy);
+  expectCalls(spy);
 }
 
 TEST_F(AzureKeys, LetOtherExceptionsPass) {
@@ -169,9 +169,9 @@ TEST_F(AzureKeys, AreMissingInWhatIsNotAKeySet) {
     provider.answer("/keys", test::ok(text)).start();
     test::CurlSpy spy;
     client.RequestKeysInfo(provider.url("/keys"), keys);
-    EXPECT_TRUE(IsEmpty(keys)) << keys.toStyledString();
+    EXPECT_TRUE(isEmpty(keys)) << keys.toStyledString();
     EXPECT_TRUE(log.is({{LOG_ERR, "azuresso.cpp", line}}));
-    ExpectCalls(spy);
+    expectCalls(spy);
   }
 }
 

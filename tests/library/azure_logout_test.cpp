@@ -21,13 +21,13 @@ const std::string kRelay = "%2Fwebman%2Fssoclient%2Frelay.html";
 
 class AzureLogout : public testing::Test {
  protected:
-  static void Configure(const std::string& endpoint) {
+  static void configure(const std::string& endpoint) {
     Json::Value file;
     file["azure_logout_endpoint"] = endpoint;
     test::writeConfig("azure.conf", file.toStyledString());
   }
 
-  void SetUp() override { Configure(kEndpoint); }
+  void SetUp() override { configure(kEndpoint); }
   void TearDown() override { EXPECT_TRUE(log.isEmpty()); }
 
   test::Log log;
@@ -35,7 +35,7 @@ class AzureLogout : public testing::Test {
 
 TEST_F(AzureLogout, WithoutAnAddressIsTheEndpointAlone) {
   for (const std::string& endpoint : {kEndpoint, kEndpoint + "?a=b", std::string()}) {
-    Configure(endpoint);
+    configure(endpoint);
     EXPECT_EQ(GetAzureSSOLogoutURL(""), endpoint);
   }
 }
@@ -87,7 +87,7 @@ TEST_F(AzureLogout, ThrowsForAnAddressShorterThanTheSuffix) {
 
 TEST_F(AzureLogout, UsesTheEndpointAsItIs) {
   for (const char* endpoint : {"", "https://a/b?c=d", "not a URL"}) {
-    Configure(endpoint);
+    configure(endpoint);
     EXPECT_EQ(GetAzureSSOLogoutURL("http://a.b"), endpoint + kQuery + "http%3A%2F%2Fa.b" + kRelay);
   }
 }

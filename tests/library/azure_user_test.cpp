@@ -21,25 +21,25 @@ const char kBadName[] = "cannot get the user name!";
 
 class AzureUser : public testing::Test {
  protected:
-  void Store(const std::string& token) {
+  void store(const std::string& token) {
     Json::Value response;
     response["id_token"] = token;
     client.ProcessTokenResponse(response.toStyledString());
   }
 
   // A token with these claims; header and signature are not looked at here.
-  void StoreClaims(const std::string& claims) { Store("!." + test::base64url(claims) + ".!"); }
+  void storeClaims(const std::string& claims) { store("!." + test::base64url(claims) + ".!"); }
 
-  std::string UserOf(const std::string& claims) {
-    StoreClaims(claims);
+  std::string userOf(const std::string& claims) {
+    storeClaims(claims);
     std::string name = "before";
     EXPECT_NO_THROW(client.GetUserName(name)) << claims;
     return name;
   }
 
-  void ExpectRefused(const std::string& claims, const std::string& message) {
+  void expectRefused(const std::string& claims, const std::string& message) {
     SCOPED_TRACE(claims);
-    StoreClaims(claims);
+    storeClaims(claims);
     EXPECT_TRUE(throws<std::invalid_argument>(message, [&] { client.GetUserName(user); }));
     EXPECT_EQ(user, "before");
   }
@@ -52,58 +52,58 @@ class AzureUser : public testing::Test {
 };
 
 TEST_F(AzureUser, IsTheUpperCasedDomainAndTheAccountAsItIs) {
-  EXPECT_EQ(UserOf(R"({"unique_name":"Alice.B@corp.Example.com"})"), "CORP.EXAMPLE.COM\\Alice.B");
-  EXPECT_EQ(UserOf(R"({"unique_name":"a b+c\\d@x"})"), "X\\a b+c\\d");
+  EXPECT_EQ(userOf(R"({"unique_name":"Alice.B@corp.Example.com"})"), "CORP.EXAMPLE.COM\\Alice.B");
+  EXPECT_EQ(userOf(R"({"unique_name":"a b+c\\d@x"})"), "X\\a b+c\\d");
 }
 
 TEST_F(AzureUser, IsNamedByUniqueNameBeforeEmail) {
-  EXPECT_EQ(UserOf(R"({"email":"bob@mail.de", "unique_name":"alice@corp.de"})"), "CORP.DE\\alice");
+  EXPECT_EQ(userOf(R"({"email":"bob@mail.de", "unique_name":"alice@corp.de"})"), "CORP.DE\\alice");
 }
 
 TEST_F(AzureUser, IsNamedByEmailWithoutAUniqueNameThatIsText) {
   for (const char* unique_name :
        {"", R"("unique_name":5,)", R"("unique_name":null,)", R"("unique_name":["a@b"],)",
         R"("unique_name":{"a@b":1},)", R"("upn":"alice@corp.de",)"})
-    EXPECT_EQ(UserOf(std::string("{") + unique_name + R"("email":"bob@mail.de"})"), "MAIL.DE\\bob");
+    EXPECT_EQ(userOf(std::string("{") + unique_name + R"("email":"bob@mail.de"})"), "MAIL.DE\\bob");
 }
 
 TEST_F(AzureUser, WithoutANameIsRefused) {
   for (const char* claims :
        {"{}", R"({"unique_name":5})", R"({"email":true})", R"({"unique_name":null, "email":null})",
         R"({"sub":"alice@corp.de", "preferred_username":"alice@corp.de", "Email":"a@b"})"})
-    ExpectRefused(claims, kNoName);
+    expectRefused(claims, kNoName);
 }
 
 TEST_F(AzureUser, WithoutAnObjectOfClaimsIsRefused) {
   for (const char* claims : {"null", "502", "true", "[]", R"(["email"])", R"("email")"})
-    ExpectRefused(claims, kNoName);
+    expectRefused(claims, kNoName);
 }
 
 TEST_F(AzureUser, NeedsExactlyOneAtSign) {
   for (const char* name : {"", "alice", "alice@@corp.de", "alice@corp@de", "@@", "@alice@", "a@b@"})
-    ExpectRefused(std::string(R"({"unique_name":")") + name + "\"}", kBadName);
+    expectRefused(std::string(R"({"unique_name":")") + name + "\"}", kBadName);
 }
 
 // The first choice is final.
 TEST_F(AzureUser, IsNotNamedByEmailWhenUniqueNameIsUnusable) {
   for (const char* name : {"", "alice", "alice@@corp.de"})
-    ExpectRefused(std::string(R"({"email":"bob@mail.de", "unique_name":")") + name + "\"}",
+    expectRefused(std::string(R"({"email":"bob@mail.de", "unique_name":")") + name + "\"}",
                   kBadName);
 }
 
 TEST_F(AzureUser, MayHaveAnEmptyAccountOrDomain) {
-  EXPECT_EQ(UserOf(R"({"unique_name":"alice@"})"), "\\alice");
-  EXPECT_EQ(UserOf(R"({"unique_name":"@corp.de"})"), "CORP.DE\\");
-  EXPECT_EQ(UserOf(R"({"unique_name":"@"})"), "\\");
+  EXPECT_EQ(userOf(R"({"unique_name":"alice@"})"), "\\alice");
+  EXPECT_EQ(userOf(R"({"unique_name":"@corp.de"})"), "CORP.DE\\");
+  EXPECT_EQ(userOf(R"({"unique_name":"@"})"), "\\");
 }
 
 TEST_F(AzureUser, KeepsBytesThatTheLocaleDoesNotKnow) {
-  EXPECT_EQ(UserOf("{\"unique_name\":\"j\xc3\xbcrgen@m\xc3\xbcnchen.de\"}"),
+  EXPECT_EQ(userOf("{\"unique_name\":\"j\xc3\xbcrgen@m\xc3\xbcnchen.de\"}"),
             "M\xc3\xbcNCHEN.DE\\j\xc3\xbcrgen");
 }
 
 TEST_F(AzureUser, ReachesThePlatformUpToAZeroByte) {
-  EXPECT_EQ(UserOf(R"({"unique_name":"ali\u0000ce@corp.de"})"), "CORP.DE\\ali");
+  EXPECT_EQ(userOf(R"({"unique_name":"ali\u0000ce@corp.de"})"), "CORP.DE\\ali");
 }
 
 // A locale in which the letter "c" becomes a number sign and nothing else has an upper case.
@@ -118,19 +118,19 @@ class NumberSign : public std::ctype<char> {
 
 TEST_F(AzureUser, HasADomainInTheUpperCaseOfTheGlobalLocale) {
   const std::locale before = std::locale::global(std::locale(std::locale(), new NumberSign));
-  EXPECT_EQ(UserOf(R"({"unique_name":"alice@corp.com"})"), "#orp.#om\\alice");
+  EXPECT_EQ(userOf(R"({"unique_name":"alice@corp.com"})"), "#orp.#om\\alice");
   std::locale::global(before);
-  EXPECT_EQ(UserOf(R"({"unique_name":"alice@corp.com"})"), "CORP.COM\\alice");
+  EXPECT_EQ(userOf(R"({"unique_name":"alice@corp.com"})"), "CORP.COM\\alice");
 }
 
 TEST_F(AzureUser, OfUpTo1022BytesFitsThePlatform) {
   const std::string account(1022 - 2, 'a');
-  EXPECT_EQ(UserOf("{\"unique_name\":\"" + account + "@x\"}"), "X\\" + account);
+  EXPECT_EQ(userOf("{\"unique_name\":\"" + account + "@x\"}"), "X\\" + account);
 }
 
 TEST_F(AzureUser, ThatThePlatformRefusesIsLeftQualified) {
   const std::string account(1023 - 2, 'a');
-  StoreClaims("{\"unique_name\":\"" + account + "@x\"}");
+  storeClaims("{\"unique_name\":\"" + account + "@x\"}");
   EXPECT_TRUE(throws<sso_op_failed>("QOVAWinsUserNameFqdn2Netbios failed.",
                                     [&] { client.GetUserName(user); }));
   EXPECT_EQ(user, "X\\" + account);
@@ -142,12 +142,12 @@ class AzureClaims : public AzureUser {
 };
 
 TEST_F(AzureClaims, AreTheBodyOfTheToken) {
-  StoreClaims(R"({"sub":"s", "list":[1,2]})");
+  storeClaims(R"({"sub":"s", "list":[1,2]})");
   client.GetUserInfo(info);
   EXPECT_EQ(info["sub"], "s");
   EXPECT_EQ(info["list"][1], 2);
   EXPECT_EQ(info.size(), 2u);
-  StoreClaims("[7]");
+  storeClaims("[7]");
   client.GetUserInfo(info);
   EXPECT_EQ(info.size(), 1u) << "what was there is replaced";
   EXPECT_EQ(info[0], 7);
@@ -156,7 +156,7 @@ TEST_F(AzureClaims, AreTheBodyOfTheToken) {
 TEST_F(AzureClaims, NeedAToken) {
   EXPECT_TRUE(throws<std::invalid_argument>(kNoToken, [&] { client.GetUserInfo(info); }));
   EXPECT_TRUE(throws<std::invalid_argument>(kNoToken, [&] { client.GetUserName(user); }));
-  Store("");
+  store("");
   EXPECT_TRUE(throws<std::invalid_argument>(kNoToken, [&] { client.GetUserInfo(info); }));
   EXPECT_TRUE(throws<std::invalid_argument>(kNoToken, [&] { client.GetUserName(user); }));
   EXPECT_EQ(info, "before");
@@ -165,20 +165,20 @@ TEST_F(AzureClaims, NeedAToken) {
 
 TEST_F(AzureClaims, NeedATokenThatCanBeRead) {
   for (const char* token : {"a.b", "a", "a.b.c.d"}) {
-    Store(token);
+    store(token);
     EXPECT_TRUE(
         throws<std::invalid_argument>("bad jwt format!", [&] { client.GetUserInfo(info); }));
     EXPECT_TRUE(
         throws<std::invalid_argument>("bad jwt format!", [&] { client.GetUserName(user); }));
   }
   for (const char* token : {"e30.!!!!.s", "e30.A.s", "e30.aGVsbG8.s"}) {
-    Store(token);
+    store(token);
     EXPECT_TRUE(
         throws<std::invalid_argument>("bad jwt body format!", [&] { client.GetUserInfo(info); }));
     EXPECT_TRUE(
         throws<std::invalid_argument>("bad jwt body format!", [&] { client.GetUserName(user); }));
   }
-  Store("e30..s");
+  store("e30..s");
   EXPECT_TRUE(throws<std::logic_error>([&] { client.GetUserInfo(info); }));
   EXPECT_TRUE(throws<std::logic_error>([&] { client.GetUserName(user); }));
   EXPECT_EQ(info, "before");
@@ -187,7 +187,7 @@ TEST_F(AzureClaims, NeedATokenThatCanBeRead) {
 
 TEST_F(AzureClaims, StayInTheClient) {
   const std::string token = "!." + test::base64url(R"({"unique_name":"a@b"})") + ".!";
-  Store(token);
+  store(token);
   client.GetUserInfo(info);
   client.GetUserName(user);
   EXPECT_EQ(client.GetToken(), token);

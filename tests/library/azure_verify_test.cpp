@@ -25,7 +25,7 @@ const char kNoKey[] = "kid does not exist in Azure verified kyes";
 const char kWrongSignature[] = "verify rsa signature failed";
 const test::Expected kSignatureLine = {LOG_ERR, "jwt.cpp", "EVP_DigestVerifyFinal failed"};
 
-test::Expected KeysLine(const std::string& what) {
+test::Expected keysLine(const std::string& what) {
   return {LOG_ERR, "azuresso.cpp", "request wellknown uri " + what + "."};
 }
 
@@ -43,21 +43,21 @@ class AzureVerify : public testing::Test {
   }
 
   // A token with a signature that is not one.
-  std::string Unsigned() const {
+  std::string unsignedToken() const {
     return test::signingInput(header.toStyledString(), body.toStyledString()) + ".c2ln";
   }
 
-  std::string Signed(const std::string& algorithm = "RS256") const {
+  std::string signedToken(const std::string& algorithm = "RS256") const {
     return test::rsaToken(test::anyRsaKey(), header.toStyledString(), body.toStyledString(),
                           algorithm);
   }
 
-  static std::string KeySet(const std::string& keys) { return "{\"keys\":[" + keys + "]}"; }
-  static std::string GoodKey() { return test::anyRsaKey().jwk("the key"); }
+  static std::string keySet(const std::string& keys) { return "{\"keys\":[" + keys + "]}"; }
+  static std::string goodKey() { return test::anyRsaKey().jwk("the key"); }
 
   // Verifies a token against a provider with this key set, and this discovery document if it is
   // not the ordinary one ("KEYS" in it is the address of the key set).
-  void Verify(const std::string& token, const test::Answer& keys, std::string discovery = "") {
+  void verify(const std::string& token, const test::Answer& keys, std::string discovery = "") {
     log.clear();
     provider = std::make_unique<test::Provider>();
     if (discovery.empty()) discovery = R"({"issuer":"x", "jwks_uri":"KEYS"})";
@@ -65,15 +65,15 @@ class AzureVerify : public testing::Test {
     const size_t at = discovery.find("KEYS");
     if (at != std::string::npos) discovery.replace(at, 4, url);
     provider->answer("/discovery", test::ok(discovery)).answer("/keys", keys).start();
-    Configure(provider->url("/discovery"));
+    configure(provider->url("/discovery"));
     AzureSSOClient client;
-    VerifyWith(client, token);
+    verifyWith(client, token);
   }
 
-  void Verify(const std::string& token, const std::string& keys) { Verify(token, test::ok(keys)); }
-  void Verify(const std::string& token) { Verify(token, KeySet(GoodKey())); }
+  void verify(const std::string& token, const std::string& keys) { verify(token, test::ok(keys)); }
+  void verify(const std::string& token) { verify(token, keySet(goodKey())); }
 
-  static void Configure(const std::string& wellknown) {
+  static void configure(const std::string& wellknown) {
     Json::Value file;
     file["azure_wellknown"] = wellknown;
     file["azure_client_id"] = "the device";
@@ -81,7 +81,7 @@ class AzureVerify : public testing::Test {
     test::writeConfig("azure.conf", file.toStyledString());
   }
 
-  static void VerifyWith(AzureSSOClient& client, const std::string& token) {
+  static void verifyWith(AzureSSOClient& client, const std::string& token) {
     Json::Value response;
     response["id_token"] = token;
     client.ProcessTokenResponse(response.toStyledString());
@@ -93,7 +93,7 @@ class AzureVerify : public testing::Test {
     client.VerifyIDToken();
   }
 
-  std::vector<std::string> Requested() const {
+  std::vector<std::string> requested() const {
     std::vector<std::string> targets;
     for (const test::Request& request : provider->requests())
       targets.push_back(request.method + " " + request.target);
@@ -111,15 +111,15 @@ class AzureVerify : public testing::Test {
 TEST_F(AzureVerify, AcceptsTheThreeAlgorithms) {
   for (const char* algorithm : {"RS256", "RS384", "RS512"}) {
     header["alg"] = algorithm;
-    EXPECT_NO_THROW(Verify(Signed(algorithm))) << algorithm;
-    EXPECT_EQ(Requested(), kBoth);
+    EXPECT_NO_THROW(verify(signedToken(algorithm))) << algorithm;
+    EXPECT_EQ(requested(), kBoth);
     EXPECT_TRUE(log.isEmpty());
   }
 }
 
 TEST_F(AzureVerify, RefusesTheDigestOfAnotherAlgorithm) {
   header["alg"] = "RS512";
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(Signed("RS256")); }));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(signedToken("RS256")); }));
   EXPECT_TRUE(log.is({kSignatureLine}));
 }
 
@@ -128,40 +128,43 @@ TEST_F(AzureVerify, RefusesEveryOtherAlgorithm) {
                                 "RS25", "RS2560", " RS256", "RS256 ", "RS128"}) {
     header["alg"] = algorithm;
     EXPECT_TRUE(throws<jwt_not_support>(std::string(algorithm) + " algorithm is not supported",
-                                        [&] { Verify(Signed()); }));
-    EXPECT_EQ(Requested(), kBoth) << "the key is looked for first";
+                                        [&] { verify(signedToken()); }));
+    EXPECT_EQ(requested(), kBoth) << "the key is looked for first";
     EXPECT_TRUE(log.isEmpty());
   }
 }
 
 TEST_F(AzureVerify, NamesAnAlgorithmThatIsNoTextByItsText) {
   header["alg"] = 5;
-  EXPECT_TRUE(throws<jwt_not_support>("5 algorithm is not supported", [&] { Verify(Signed()); }));
+  EXPECT_TRUE(
+      throws<jwt_not_support>("5 algorithm is not supported", [&] { verify(signedToken()); }));
   header["alg"] = Json::Value();
-  EXPECT_TRUE(throws<jwt_not_support>(" algorithm is not supported", [&] { Verify(Signed()); }));
+  EXPECT_TRUE(
+      throws<jwt_not_support>(" algorithm is not supported", [&] { verify(signedToken()); }));
   header.removeMember("alg");
-  EXPECT_TRUE(throws<jwt_not_support>(" algorithm is not supported", [&] { Verify(Signed()); }));
+  EXPECT_TRUE(
+      throws<jwt_not_support>(" algorithm is not supported", [&] { verify(signedToken()); }));
 }
 
 TEST_F(AzureVerify, RefusesAnotherKeyTextOrSignature) {
-  const std::string token = Signed();
-  std::vector<std::string> wrong = {Unsigned(), token.substr(0, token.size() - 4)};
+  const std::string token = signedToken();
+  std::vector<std::string> wrong = {unsignedToken(), token.substr(0, token.size() - 4)};
   body["roles"] = "admin";
   wrong.push_back(test::signingInput(header.toStyledString(), body.toStyledString()) +
                   token.substr(token.rfind('.')));
   for (const std::string& other : wrong) {
-    EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(other); }));
+    EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(other); }));
     EXPECT_TRUE(log.is({kSignatureLine}));
   }
   const std::string foreign = test::RsaKey().jwk("the key");
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(token, KeySet(foreign)); }));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(token, keySet(foreign)); }));
   EXPECT_TRUE(log.is({kSignatureLine}));
 }
 
 TEST_F(AzureVerify, RefusesAMissingSignatureSilently) {
-  const std::string token = Signed();
+  const std::string token = signedToken();
   EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature,
-                                        [&] { Verify(token.substr(0, token.rfind('.') + 1)); }));
+                                        [&] { verify(token.substr(0, token.rfind('.') + 1)); }));
   EXPECT_TRUE(log.isEmpty());
 }
 
@@ -173,7 +176,7 @@ TEST_F(AzureVerify, LooksAtNoOtherClaim) {
   body["azp"].append("another");
   header["typ"] = "odd";
   header["x5t"] = "odd";
-  EXPECT_NO_THROW(Verify(Signed()));
+  EXPECT_NO_THROW(verify(signedToken()));
 }
 
 TEST_F(AzureVerify, FetchesNothingBeforeTheClaimsAreRight) {
@@ -181,20 +184,21 @@ TEST_F(AzureVerify, FetchesNothingBeforeTheClaimsAreRight) {
   for (const char* claim : {"exp", "tid", "aud"}) {
     body = right;
     body.removeMember(claim);
-    EXPECT_THROW(Verify(Unsigned()), std::invalid_argument);
-    EXPECT_EQ(Requested(), kNone) << claim;
+    EXPECT_THROW(verify(unsignedToken()), std::invalid_argument);
+    EXPECT_EQ(requested(), kNone) << claim;
   }
 }
 
 TEST_F(AzureVerify, NeedsTheTenantByteForByte) {
   for (const char* tenant : {"", "the tenan", "the tenant ", "The tenant", "the device"}) {
     body["tid"] = tenant;
-    EXPECT_TRUE(throws<std::invalid_argument>("tenant ID invalid", [&] { Verify(Unsigned()); }));
+    EXPECT_TRUE(
+        throws<std::invalid_argument>("tenant ID invalid", [&] { verify(unsignedToken()); }));
   }
   body["tid"] = std::string("the tenant\0", 11);
-  EXPECT_TRUE(throws<std::invalid_argument>("tenant ID invalid", [&] { Verify(Unsigned()); }));
+  EXPECT_TRUE(throws<std::invalid_argument>("tenant ID invalid", [&] { verify(unsignedToken()); }));
   body["tid"] = 42;
-  EXPECT_TRUE(throws<std::invalid_argument>("tenant ID invalid", [&] { Verify(Unsigned()); }));
+  EXPECT_TRUE(throws<std::invalid_argument>("tenant ID invalid", [&] { verify(unsignedToken()); }));
 }
 
 TEST_F(AzureVerify, ComparesTheTextsOfNumbersAndOfWhatIsMissing) {
@@ -202,12 +206,13 @@ TEST_F(AzureVerify, ComparesTheTextsOfNumbersAndOfWhatIsMissing) {
   AzureSSOClient numbered;
   body["tid"] = 42;
   body["aud"] = 7;
-  EXPECT_TRUE(throws<std::invalid_argument>(kNoKey, [&] { VerifyWith(numbered, Unsigned()); }));
+  EXPECT_TRUE(
+      throws<std::invalid_argument>(kNoKey, [&] { verifyWith(numbered, unsignedToken()); }));
   test::removeConfig("azure.conf");
   AzureSSOClient empty;
   body["tid"] = Json::Value();
   body.removeMember("aud");
-  EXPECT_TRUE(throws<std::invalid_argument>(kNoKey, [&] { VerifyWith(empty, Unsigned()); }));
+  EXPECT_TRUE(throws<std::invalid_argument>(kNoKey, [&] { verifyWith(empty, unsignedToken()); }));
 }
 
 TEST_F(AzureVerify, LetsTheErrorOfTheJsonLibraryPass) {
@@ -217,8 +222,8 @@ TEST_F(AzureVerify, LetsTheErrorOfTheJsonLibraryPass) {
     const Json::Value right = *place;
     for (const Json::ValueType type : {Json::arrayValue, Json::objectValue}) {
       *place = Json::Value(type);
-      EXPECT_TRUE(throws<Json::LogicError>([&] { Verify(Unsigned()); }));
-      EXPECT_EQ(Requested(), kNone);
+      EXPECT_TRUE(throws<Json::LogicError>([&] { verify(unsignedToken()); }));
+      EXPECT_EQ(requested(), kNone);
     }
     *place = right;
   }
@@ -228,7 +233,7 @@ TEST_F(AzureVerify, LetsTheErrorOfTheJsonLibraryPass) {
 TEST_F(AzureVerify, ReportsTheFirstOfManyFaults) {
   std::string keys = R"({"keys":[{"kid":"the key"}]})";
   const auto refuses = [&](const std::string& message, const std::string& token) {
-    return throws<std::invalid_argument>(message, [&] { Verify(token, keys); });
+    return throws<std::invalid_argument>(message, [&] { verify(token, keys); });
   };
   EXPECT_TRUE(refuses("token cannot be empty", ""));
   EXPECT_TRUE(refuses("bad jwt format!", "!!!!.!!!!"));
@@ -239,82 +244,82 @@ TEST_F(AzureVerify, ReportsTheFirstOfManyFaults) {
   body["exp"] = 1;
   body["tid"] = "another";
   body["aud"] = "another";
-  EXPECT_TRUE(refuses("id_token expired.", Unsigned()));
+  EXPECT_TRUE(refuses("id_token expired.", unsignedToken()));
   body["exp"] = Json::Int64{4102444800};
-  EXPECT_TRUE(refuses("tenant ID invalid", Unsigned()));
+  EXPECT_TRUE(refuses("tenant ID invalid", unsignedToken()));
   body["tid"] = "the tenant";
-  EXPECT_TRUE(refuses("client ID invalid", Unsigned()));
+  EXPECT_TRUE(refuses("client ID invalid", unsignedToken()));
   body["aud"] = "the device";
-  EXPECT_TRUE(refuses(kNoKey, Unsigned()));
+  EXPECT_TRUE(refuses(kNoKey, unsignedToken()));
   header["kid"] = "the key";
-  EXPECT_TRUE(refuses("RSA public 'n' cannot be found!", Unsigned()));
+  EXPECT_TRUE(refuses("RSA public 'n' cannot be found!", unsignedToken()));
   keys = R"({"keys":[{"kid":"the key", "n":"AQAB"}]})";
-  EXPECT_TRUE(refuses("RSA public 'e' cannot be found!", Unsigned()));
-  keys = KeySet(GoodKey());
+  EXPECT_TRUE(refuses("RSA public 'e' cannot be found!", unsignedToken()));
+  keys = keySet(goodKey());
   EXPECT_TRUE(throws<jwt_not_support>("none algorithm is not supported",
-                                      [&] { Verify(Unsigned(), keys); }));
+                                      [&] { verify(unsignedToken(), keys); }));
   header["alg"] = "RS256";
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(Unsigned(), keys); }));
-  EXPECT_NO_THROW(Verify(Signed(), keys));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(unsignedToken(), keys); }));
+  EXPECT_NO_THROW(verify(signedToken(), keys));
 }
 
 class AzureKey : public AzureVerify {};
 
 TEST_F(AzureKey, IsTheOneWithTheKidOfTheHeader) {
   const std::string other = test::RsaKey().jwk("another");
-  for (const std::string& keys : {GoodKey(), other + "," + GoodKey(), GoodKey() + "," + other}) {
-    EXPECT_NO_THROW(Verify(Signed(), KeySet(keys)));
+  for (const std::string& keys : {goodKey(), other + "," + goodKey(), goodKey() + "," + other}) {
+    EXPECT_NO_THROW(verify(signedToken(), keySet(keys)));
     EXPECT_TRUE(log.isEmpty());
   }
 }
 
 TEST_F(AzureKey, IsTheFirstOfTwoWithTheSameKid) {
   const std::string wrong = test::RsaKey().jwk("the key");
-  EXPECT_NO_THROW(Verify(Signed(), KeySet(GoodKey() + "," + wrong)));
+  EXPECT_NO_THROW(verify(signedToken(), keySet(goodKey() + "," + wrong)));
   EXPECT_TRUE(throws<jwt_verify_failed>(
-      kWrongSignature, [&] { Verify(Signed(), KeySet(wrong + "," + GoodKey())); }));
+      kWrongSignature, [&] { verify(signedToken(), keySet(wrong + "," + goodKey())); }));
   EXPECT_TRUE(throws<std::invalid_argument>("RSA public 'n' cannot be found!", [&] {
-    Verify(Signed(), KeySet(R"({"kid":"the key"},)" + GoodKey()));
+    verify(signedToken(), keySet(R"({"kid":"the key"},)" + goodKey()));
   }));
 }
 
 TEST_F(AzureKey, IsFoundBehindWhatHasNoKid) {
   for (const char* passed : {"{}", R"({"n":"AQAB","e":"AQAB"})", "null", "5", "\"the key\"", "[]",
                              R"(["the key"])", R"([{"kid":"the key"}])", R"({"KID":"the key"})"}) {
-    EXPECT_NO_THROW(Verify(Signed(), KeySet(passed + std::string(",") + GoodKey()))) << passed;
+    EXPECT_NO_THROW(verify(signedToken(), keySet(passed + std::string(",") + goodKey()))) << passed;
     EXPECT_TRUE(log.isEmpty());
   }
 }
 
 TEST_F(AzureKey, IsComparedByTheTextOfItsKid) {
   header["kid"] = 42;
-  EXPECT_NO_THROW(Verify(Signed(), KeySet(test::anyRsaKey().jwk("42"))));
+  EXPECT_NO_THROW(verify(signedToken(), keySet(test::anyRsaKey().jwk("42"))));
   header["kid"] = "42";
   const Json::Value number = 42;
   std::string key = test::anyRsaKey().jwk("KID");
   key.replace(key.find("\"KID\""), 5, "42");
-  EXPECT_NO_THROW(Verify(Signed(), KeySet(key)));
+  EXPECT_NO_THROW(verify(signedToken(), keySet(key)));
   // A header without a "kid" names the key whose "kid" is empty.
   header.removeMember("kid");
-  EXPECT_NO_THROW(Verify(Signed(), KeySet(GoodKey() + "," + test::anyRsaKey().jwk(""))));
+  EXPECT_NO_THROW(verify(signedToken(), keySet(goodKey() + "," + test::anyRsaKey().jwk(""))));
 }
 
 TEST_F(AzureKey, WithAnotherKidIsNotTaken) {
   for (const char* kid : {"The key", "the key ", "the ke", "", "another"}) {
     header["kid"] = kid;
-    EXPECT_TRUE(throws<std::invalid_argument>(kNoKey, [&] { Verify(Signed()); })) << kid;
-    EXPECT_EQ(Requested(), kBoth);
+    EXPECT_TRUE(throws<std::invalid_argument>(kNoKey, [&] { verify(signedToken()); })) << kid;
+    EXPECT_EQ(requested(), kBoth);
     EXPECT_TRUE(log.isEmpty());
   }
 }
 
 TEST_F(AzureKey, WithAKidThatIsNoTextLetsTheErrorOfTheJsonLibraryPass) {
   for (const char* kid : {"[]", "{}", "[\"the key\"]"}) {
-    const std::string keys = KeySet(std::string("{\"kid\":") + kid + "}," + GoodKey());
-    EXPECT_TRUE(throws<Json::LogicError>([&] { Verify(Signed(), keys); })) << kid;
+    const std::string keys = keySet(std::string("{\"kid\":") + kid + "}," + goodKey());
+    EXPECT_TRUE(throws<Json::LogicError>([&] { verify(signedToken(), keys); })) << kid;
   }
   // Nobody looks behind the key that was found.
-  EXPECT_NO_THROW(Verify(Signed(), KeySet(GoodKey() + ",{\"kid\":[]}")));
+  EXPECT_NO_THROW(verify(signedToken(), keySet(goodKey() + ",{\"kid\":[]}")));
 }
 
 TEST_F(AzureKey, NeedsAModulusThenAnExponentThatAreText) {
@@ -326,9 +331,9 @@ TEST_F(AzureKey, NeedsAModulusThenAnExponentThatAreText) {
     SCOPED_TRACE(bad);
     for (const std::string& keys : {kid + n + "}", kid + n + e + "}", kid + n + ",\"e\":\"AQAB\"}"})
       EXPECT_TRUE(throws<std::invalid_argument>("RSA public 'n' cannot be found!",
-                                                [&] { Verify(Signed(), KeySet(keys)); }));
+                                                [&] { verify(signedToken(), keySet(keys)); }));
     EXPECT_TRUE(throws<std::invalid_argument>("RSA public 'e' cannot be found!", [&] {
-      Verify(Signed(), KeySet(kid + ",\"n\":\"AQAB\"" + e + "}"));
+      verify(signedToken(), keySet(kid + ",\"n\":\"AQAB\"" + e + "}"));
     }));
     EXPECT_TRUE(log.isEmpty());
   }
@@ -336,11 +341,11 @@ TEST_F(AzureKey, NeedsAModulusThenAnExponentThatAreText) {
 
 TEST_F(AzureKey, WithEmptyNumbersFailsSilently) {
   EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] {
-    Verify(Signed(), KeySet(R"({"kid":"the key", "n":"", "e":"AQAB"})"));
+    verify(signedToken(), keySet(R"({"kid":"the key", "n":"", "e":"AQAB"})"));
   }));
   EXPECT_TRUE(log.isEmpty());
   EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] {
-    Verify(Signed(), KeySet(R"({"kid":"the key", "n":"AQAB", "e":""})"));
+    verify(signedToken(), keySet(R"({"kid":"the key", "n":"AQAB", "e":""})"));
   }));
   EXPECT_TRUE(log.isEmpty());
 }
@@ -354,80 +359,82 @@ TEST_F(AzureKey, NeedNotSayWhatItIsFor) {
   odd["kty"] = "EC";
   odd["use"] = "enc";
   odd["alg"] = "none";
-  EXPECT_NO_THROW(Verify(Signed(), KeySet(odd.toStyledString())));
+  EXPECT_NO_THROW(verify(signedToken(), keySet(odd.toStyledString())));
 }
 
 class AzureKeySet : public AzureVerify {
  protected:
   // Everything that leaves no key set ends in the one message, here with these lines before it.
-  void ExpectNoKey(const test::Answer& keys, const std::vector<test::Expected>& lines,
+  void expectNoKey(const test::Answer& keys, const std::vector<test::Expected>& lines,
                    const std::string& discovery = "") {
-    EXPECT_TRUE(throws<std::invalid_argument>(kNoKey, [&] { Verify(Signed(), keys, discovery); }));
+    EXPECT_TRUE(
+        throws<std::invalid_argument>(kNoKey, [&] { verify(signedToken(), keys, discovery); }));
     EXPECT_TRUE(log.is(lines));
   }
 };
 
 TEST_F(AzureKeySet, IsFetchedAnewForEachToken) {
-  Verify(Signed());
+  verify(signedToken());
   AzureSSOClient client;
-  VerifyWith(client, Signed());
-  VerifyWith(client, Signed());
-  EXPECT_EQ(Requested(), (std::vector<std::string>{"GET /discovery", "GET /keys", "GET /discovery",
+  verifyWith(client, signedToken());
+  verifyWith(client, signedToken());
+  EXPECT_EQ(requested(), (std::vector<std::string>{"GET /discovery", "GET /keys", "GET /discovery",
                                                    "GET /keys", "GET /discovery", "GET /keys"}));
 }
 
 TEST_F(AzureKeySet, ThatIsNotJsonHoldsNoKey) {
-  const std::string good = KeySet(GoodKey());
+  const std::string good = keySet(goodKey());
   for (const std::string& text : {std::string(), std::string("<html>"), std::string("{"),
                                   good.substr(0, good.size() - 1), good.substr(0, good.size() - 2),
-                                  good.substr(0, good.size() - 3), "{\"keys\":[" + GoodKey() + "],",
-                                  "{\"keys\":[" + GoodKey() + "],\"x\":" + std::string(2000, '[')})
-    ExpectNoKey(test::ok(text), {KeysLine("bad wellknown json format.")});
+                                  good.substr(0, good.size() - 3), "{\"keys\":[" + goodKey() + "],",
+                                  "{\"keys\":[" + goodKey() + "],\"x\":" + std::string(2000, '[')})
+    expectNoKey(test::ok(text), {keysLine("bad wellknown json format.")});
 }
 
 TEST_F(AzureKeySet, WithoutKeysHoldsNoKey) {
   const test::Expected line = {LOG_ERR, "azuresso.cpp", "no kyes information"};
   for (const char* text : {"{}", R"({"Keys":[]})", R"({"error":"x"})", "null", "502 Bad Gateway",
                            "true", "[]", "\"keys\"", R"(["keys"])", R"([{"keys":[]}])"})
-    ExpectNoKey(test::ok(text), {line});
+    expectNoKey(test::ok(text), {line});
 }
 
 TEST_F(AzureKeySet, WhoseKeysAreNoArrayHoldsNoKey) {
   const std::vector<std::string> values = {
-      "null", "5", "\"the key\"", "[]", "{}", GoodKey(), "{\"the key\":" + GoodKey() + "}"};
-  for (const std::string& keys : values) ExpectNoKey(test::ok("{\"keys\":" + keys + "}"), {});
+      "null", "5", "\"the key\"", "[]", "{}", goodKey(), "{\"the key\":" + goodKey() + "}"};
+  for (const std::string& keys : values) expectNoKey(test::ok("{\"keys\":" + keys + "}"), {});
 }
 
 TEST_F(AzureKeySet, CountsWhateverTheStatusOfItsAnswer) {
-  EXPECT_NO_THROW(Verify(Signed(), test::failed(500, KeySet(GoodKey()))));
-  ExpectNoKey(test::failed(404, "<html>not found</html>"),
-              {KeysLine("bad wellknown json format.")});
+  EXPECT_NO_THROW(verify(signedToken(), test::failed(500, keySet(goodKey()))));
+  expectNoKey(test::failed(404, "<html>not found</html>"),
+              {keysLine("bad wellknown json format.")});
 }
 
 TEST_F(AzureKeySet, ThatBreaksOffHoldsNoKey) {
-  test::Answer answer = test::ok(KeySet(GoodKey()));
+  test::Answer answer = test::ok(keySet(goodKey()));
   answer.contentLength = static_cast<long long>(answer.body.size()) + 1;
-  ExpectNoKey(answer, {KeysLine(curl_easy_strerror(CURLE_PARTIAL_FILE))});
+  expectNoKey(answer, {keysLine(curl_easy_strerror(CURLE_PARTIAL_FILE))});
 }
 
 TEST_F(AzureKeySet, ThatCannotBeReachedHoldsNoKey) {
   const std::string nowhere =
       "{\"jwks_uri\":\"http://localhost:" + std::to_string(test::unusedPort()) + "/keys\"}";
-  ExpectNoKey(test::ok(""), {KeysLine(curl_easy_strerror(CURLE_COULDNT_CONNECT))}, nowhere);
-  EXPECT_EQ(Requested(), std::vector<std::string>{"GET /discovery"});
+  expectNoKey(test::ok(""), {keysLine(curl_easy_strerror(CURLE_COULDNT_CONNECT))}, nowhere);
+  EXPECT_EQ(requested(), std::vector<std::string>{"GET /discovery"});
 }
 
 TEST_F(AzureKeySet, WithoutAnAddressHoldsNoKey) {
   for (const char* discovery :
        {"{}", R"({"jwks_uri":null})", R"({"jwks_uri":""})", R"({"JWKS_URI":"KEYS"})", "null",
         "502 Bad Gateway", "[]", R"(["jwks_uri"])", "\"jwks_uri\""})
-    ExpectNoKey(test::ok(KeySet(GoodKey())), {KeysLine(kNoAddress)}, discovery);
+    expectNoKey(test::ok(keySet(goodKey())), {keysLine(kNoAddress)}, discovery);
 }
 
 TEST_F(AzureKeySet, WithAnAddressThatIsNoTextLetsTheErrorOfTheJsonLibraryPass) {
   for (const char* address : {"[]", "{}", "[\"KEYS\"]"}) {
     EXPECT_TRUE(throws<Json::LogicError>([&] {
-      Verify(Signed(), test::ok(KeySet(GoodKey())), std::string("{\"jwks_uri\":") + address + "}");
+      verify(signedToken(), test::ok(keySet(goodKey())),
+             std::string("{\"jwks_uri\":") + address + "}");
     }));
     EXPECT_TRUE(log.isEmpty());
   }
@@ -437,23 +444,23 @@ const test::Expected kDiscoveryLine = {LOG_ERR, "sso.cpp", "bad wellknown json f
 
 TEST_F(AzureKeySet, IsNotFoundThroughABadDiscoveryDocument) {
   for (const char* discovery : {"<html>", "{", "{\"jwks_uri\":\"KEYS"})
-    ExpectNoKey(test::ok(KeySet(GoodKey())), {kDiscoveryLine, KeysLine(kNoAddress)}, discovery);
+    expectNoKey(test::ok(keySet(goodKey())), {kDiscoveryLine, keysLine(kNoAddress)}, discovery);
 }
 
 // What was read of a document before its fault is kept.
 TEST_F(AzureKeySet, IsFoundThroughADiscoveryDocumentThatBreaksOffBehindIt) {
   EXPECT_NO_THROW(
-      Verify(Signed(), test::ok(KeySet(GoodKey())), "{\"jwks_uri\":\"KEYS\", \"issuer\":"));
+      verify(signedToken(), test::ok(keySet(goodKey())), "{\"jwks_uri\":\"KEYS\", \"issuer\":"));
   EXPECT_TRUE(log.is({kDiscoveryLine}));
 }
 
 TEST_F(AzureKeySet, IsNotFoundWithoutADiscoveryDocument) {
   const std::string nowhere = "http://localhost:" + std::to_string(test::unusedPort()) + "/";
-  Configure(nowhere);
+  configure(nowhere);
   AzureSSOClient client;
-  EXPECT_TRUE(throws<std::invalid_argument>(kNoKey, [&] { VerifyWith(client, Signed()); }));
+  EXPECT_TRUE(throws<std::invalid_argument>(kNoKey, [&] { verifyWith(client, signedToken()); }));
   EXPECT_TRUE(log.is(
-      {{LOG_ERR, "sso.cpp", curl_easy_strerror(CURLE_COULDNT_CONNECT)}, KeysLine(kNoAddress)}));
+      {{LOG_ERR, "sso.cpp", curl_easy_strerror(CURLE_COULDNT_CONNECT)}, keysLine(kNoAddress)}));
 }
 
 // The discovery document comes through the operation that a program may override.
@@ -470,10 +477,10 @@ class OwnDiscovery : public AzureSSOClient {
 };
 
 TEST_F(AzureKeySet, IsFoundThroughAnOverriddenDiscovery) {
-  Verify(Signed());
+  verify(signedToken());
   OwnDiscovery client(provider->url("/keys"));
-  EXPECT_NO_THROW(VerifyWith(client, Signed()));
-  EXPECT_EQ(Requested(), (std::vector<std::string>{"GET /discovery", "GET /keys", "GET /keys"}));
+  EXPECT_NO_THROW(verifyWith(client, signedToken()));
+  EXPECT_EQ(requested(), (std::vector<std::string>{"GET /discovery", "GET /keys", "GET /keys"}));
 }
 
 }  // namespace

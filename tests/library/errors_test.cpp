@@ -63,10 +63,21 @@ TEST(Errors, AreCaughtAcrossTheLibraryBoundary) {
   EXPECT_THROW(client.VerifyIDToken(), sso_exception);
 }
 
+// Programs have the constants compiled in: arrays of just these characters.
+template <std::size_t N, std::size_t M>
+void expectConstant(const char (&constant)[N], const char (&value)[M]) {
+  EXPECT_STREQ(constant, value);
+  EXPECT_EQ(N, M) << value;
+}
+
+static_assert(std::is_same_v<decltype(kSupportedProfiles), const char* const[2]>);
+
 TEST(SharedKeys, HaveTheNamesOfTheProfileFile) {
-  EXPECT_STREQ(kEnableKey, "sso_enable");
-  EXPECT_STREQ(kProfileKey, "sso_profile");
-  ASSERT_EQ(std::size(kSupportedProfiles), 2u);
+  expectConstant(kProfilePath, "/usr/qova/etc/ssoclient/profile.conf");
+  expectConstant(kAzureProfile, "azure");
+  expectConstant(kWebSphereProfile, "websphere");
+  expectConstant(kEnableKey, "sso_enable");
+  expectConstant(kProfileKey, "sso_profile");
   EXPECT_STREQ(kSupportedProfiles[0], "azure");
   EXPECT_STREQ(kSupportedProfiles[1], "websphere");
 }
@@ -102,56 +113,56 @@ TEST(Errors, AreCaughtByTheirFamilyAndNoOther) {
 
 // RFC 6749 and the providers' documents.
 TEST(SharedKeys, HaveTheNamesOfAzuresProtocol) {
-  EXPECT_STREQ(azure::kResponseType, "response_type");
-  EXPECT_STREQ(azure::kScope, "scope");
-  EXPECT_STREQ(azure::kRedirectURI, "redirect_uri");
-  EXPECT_STREQ(azure::kClientID, "client_id");
-  EXPECT_STREQ(azure::kNonce, "nonce");
-  EXPECT_STREQ(azure::kState, "state");
-  EXPECT_STREQ(azure::kGrantType, "grant_type");
-  EXPECT_STREQ(azure::kCode, "code");
-  EXPECT_STREQ(azure::kClientSecret, "client_secret");
-  EXPECT_STREQ(azure::kTokenType, "token_type");
-  EXPECT_STREQ(azure::kExpiresIn, "expires_in");
-  EXPECT_STREQ(azure::kExtExpiresIn, "ext_expires_in");
-  EXPECT_STREQ(azure::kExpiresOn, "expires_on");
-  EXPECT_STREQ(azure::kAccessToken, "access_token");
-  EXPECT_STREQ(azure::kRefreshToken, "refresh_token");
-  EXPECT_STREQ(azure::kIDToken, "id_token");
-  EXPECT_STREQ(azure::kStateAnswer, "state");
-  EXPECT_STREQ(azure::kPostLogoutRedirectURI, "post_logout_redirect_uri");
-  EXPECT_STREQ(azure::kError, "error");
-  EXPECT_STREQ(azure::kErrorDescription, "error_description");
-  EXPECT_STREQ(azure::kErrorCodes, "error_codes");
-  EXPECT_STREQ(azure::kTimestamp, "timestamp");
-  EXPECT_STREQ(azure::kTraceID, "trace_id");
-  EXPECT_STREQ(azure::kCorrelationID, "correlation_id");
-  EXPECT_STREQ(azure::kInvalidRequest, "invalid_request");
-  EXPECT_STREQ(azure::kInvalidGrant, "invalid_grant");
-  EXPECT_STREQ(azure::kUnauthorizedClient, "unauthorized_client");
-  EXPECT_STREQ(azure::kInvalidClient, "invalid_client");
-  EXPECT_STREQ(azure::kUnsupportedGrantType, "unsupported_grant_type");
-  EXPECT_STREQ(azure::kInvalidResource, "invalid_resource");
-  EXPECT_STREQ(azure::kInteractionRequired, "interaction_required");
-  EXPECT_STREQ(azure::kTemporarilyUnavailable, "temporarily_unavailable");
+  expectConstant(azure::kResponseType, "response_type");
+  expectConstant(azure::kScope, "scope");
+  expectConstant(azure::kRedirectURI, "redirect_uri");
+  expectConstant(azure::kClientID, "client_id");
+  expectConstant(azure::kNonce, "nonce");
+  expectConstant(azure::kState, "state");
+  expectConstant(azure::kGrantType, "grant_type");
+  expectConstant(azure::kCode, "code");
+  expectConstant(azure::kClientSecret, "client_secret");
+  expectConstant(azure::kTokenType, "token_type");
+  expectConstant(azure::kExpiresIn, "expires_in");
+  expectConstant(azure::kExtExpiresIn, "ext_expires_in");
+  expectConstant(azure::kExpiresOn, "expires_on");
+  expectConstant(azure::kAccessToken, "access_token");
+  expectConstant(azure::kRefreshToken, "refresh_token");
+  expectConstant(azure::kIDToken, "id_token");
+  expectConstant(azure::kStateAnswer, "state");
+  expectConstant(azure::kPostLogoutRedirectURI, "post_logout_redirect_uri");
+  expectConstant(azure::kError, "error");
+  expectConstant(azure::kErrorDescription, "error_description");
+  expectConstant(azure::kErrorCodes, "error_codes");
+  expectConstant(azure::kTimestamp, "timestamp");
+  expectConstant(azure::kTraceID, "trace_id");
+  expectConstant(azure::kCorrelationID, "correlation_id");
+  expectConstant(azure::kInvalidRequest, "invalid_request");
+  expectConstant(azure::kInvalidGrant, "invalid_grant");
+  expectConstant(azure::kUnauthorizedClient, "unauthorized_client");
+  expectConstant(azure::kInvalidClient, "invalid_client");
+  expectConstant(azure::kUnsupportedGrantType, "unsupported_grant_type");
+  expectConstant(azure::kInvalidResource, "invalid_resource");
+  expectConstant(azure::kInteractionRequired, "interaction_required");
+  expectConstant(azure::kTemporarilyUnavailable, "temporarily_unavailable");
 }
 
 TEST(SharedKeys, HaveTheNamesOfWebSpheresProtocol) {
-  EXPECT_STREQ(websphere::kScope, "scope");
-  EXPECT_STREQ(websphere::kResponseType, "response_type");
-  EXPECT_STREQ(websphere::kClientID, "client_id");
-  EXPECT_STREQ(websphere::kRedirectURI, "redirect_uri");
-  EXPECT_STREQ(websphere::kState, "state");
-  EXPECT_STREQ(websphere::kNonce, "nonce");
-  EXPECT_STREQ(websphere::kAccessToken, "access_token");
-  EXPECT_STREQ(websphere::kTokenType, "token_type");
-  EXPECT_STREQ(websphere::kIDToken, "id_token");
-  EXPECT_STREQ(websphere::kStateAnswer, "state");
-  EXPECT_STREQ(websphere::kExpiresIn, "expires_in");
-  EXPECT_STREQ(websphere::kRefreshToken, "refresh_token");
-  EXPECT_STREQ(websphere::kGrantType, "grant_type");
-  EXPECT_STREQ(websphere::kCode, "code");
-  EXPECT_STREQ(websphere::kClientSecret, "client_secret");
+  expectConstant(websphere::kScope, "scope");
+  expectConstant(websphere::kResponseType, "response_type");
+  expectConstant(websphere::kClientID, "client_id");
+  expectConstant(websphere::kRedirectURI, "redirect_uri");
+  expectConstant(websphere::kState, "state");
+  expectConstant(websphere::kNonce, "nonce");
+  expectConstant(websphere::kAccessToken, "access_token");
+  expectConstant(websphere::kTokenType, "token_type");
+  expectConstant(websphere::kIDToken, "id_token");
+  expectConstant(websphere::kStateAnswer, "state");
+  expectConstant(websphere::kExpiresIn, "expires_in");
+  expectConstant(websphere::kRefreshToken, "refresh_token");
+  expectConstant(websphere::kGrantType, "grant_type");
+  expectConstant(websphere::kCode, "code");
+  expectConstant(websphere::kClientSecret, "client_secret");
 }
 
 }  // namespace

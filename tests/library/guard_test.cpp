@@ -63,17 +63,35 @@ const Line kLeave = {kError, "ERROR: LEAVECriticalSection"};
 const Line kGroupDenied = {kError, "ERROR: setresgid(-1, 0, -1) [Operation not permitted]"};
 const Line kUserDenied = {kError, "ERROR: setresuid(-1, 0, -1) [Operation not permitted]"};
 
+// A process whose ids are the given ones, and what a construction does to it. What a case does not
+// name: no change fails, nothing is logged, errno is 0 and the file (root's, mode 0600) is read.
 struct Case {
+  Case(const char* title, test::Ids userIds, test::Ids groupIds)
+      : name(title),
+        user(userIds),
+        group(groupIds),
+        userAfter(userIds.effective),
+        groupAfter(groupIds.effective) {}
+
+  Case& failing(std::size_t nth) { return failingChange = nth, *this; }  // with EAGAIN
+  Case& makes(Calls calls) { return changes = std::move(calls), *this; }
+  Case& logs(std::vector<Line> lines) { return log = std::move(lines), *this; }
+  Case& unread() { return readable = false, *this; }
+  Case& endsAs(uid_t effectiveUser, gid_t effectiveGroup) {
+    return userAfter = effectiveUser, groupAfter = effectiveGroup, *this;
+  }
+  Case& denied() { return errnoAfter = EPERM, *this; }
+
   const char* name;
   test::Ids user;
   test::Ids group;
-  std::size_t failing;  // which change fails, with EAGAIN; 0: none is made to
-  Calls changes;
-  std::vector<Line> log;
   uid_t userAfter;
   gid_t groupAfter;
-  int errnoAfter;
-  bool readable;  // the file belongs to root, mode 0600
+  std::size_t failingChange = 0;
+  Calls changes;
+  std::vector<Line> log;
+  int errnoAfter = 0;
+  bool readable = true;
 };
 void PrintTo(const Case& each, std::ostream* out) {
   *out << each.name;
@@ -97,142 +115,102 @@ const std::vector<Line> kWholeLog = {kRaisedGroup, kRaisedUser, kRaisedUser};
 
 const Case kCases[] = {
     // With the identities that a process can really have.
-    {"RootIsSaved", kUserRootSaved, kGroupRootSaved, 0, kWhole, kWholeLog, U, G, 0, true},
-    {"RootIsReal", kUserRootReal, kGroupRootReal, 0, kWhole, kWholeLog, U, G, 0, true},
-    {"RootAlready", kRootAll, kRootAll, 0, {}, {}, 0, 0, 0, true},
-    {"RootEffectiveOnly", {U, 0, U}, {G, 0, G}, 0, {}, {}, 0, 0, 0, true},
-    {"NoRoot", kUserOnly, kGroupOnly, 0, {kG0}, {kGroupDenied, kEnter}, U, G, 0, false},
-    {"UserAlone",
-     kUserRootSaved,
-     kRootAll,
-     0,
-     {kU0, kU0, kUBack},
-     {kRaisedUser, kRaisedUser},
-     U,
-     0,
-     0,
-     true},
-    {"GroupAlone", kRootAll, kGroupRootSaved, 0, {kG0, kGBack}, {kRaisedGroup}, 0, G, 0, true},
+    Case("RootIsSaved", kUserRootSaved, kGroupRootSaved).makes(kWhole).logs(kWholeLog),
+    Case("RootIsReal", kUserRootReal, kGroupRootReal).makes(kWhole).logs(kWholeLog),
+    Case("RootAlready", kRootAll, kRootAll),
+    Case("RootEffectiveOnly", {U, 0, U}, {G, 0, G}),
+    Case("NoRoot", kUserOnly, kGroupOnly).makes({kG0}).logs({kGroupDenied, kEnter}).unread(),
+    Case("UserAlone", kUserRootSaved, kRootAll)
+        .makes({kU0, kU0, kUBack})
+        .logs({kRaisedUser, kRaisedUser}),
+    Case("GroupAlone", kRootAll, kGroupRootSaved).makes({kG0, kGBack}).logs({kRaisedGroup}),
     // The user could be raised, but is not tried once the group has failed.
-    {"NoRootGroup", kUserRootSaved, kGroupOnly, 0, {kG0}, {kGroupDenied, kEnter}, U, G, 0, false},
-    {"NoRootUser",
-     kUserOnly,
-     kGroupRootSaved,
-     0,
-     {kG0, kU0, kGBack},
-     {kRaisedGroup, kUserDenied, kEnter},
-     U,
-     G,
-     0,
-     false},
-    {"NoRootUserRootGroup", kUserOnly, kRootAll, 0, {kU0}, {kUserDenied, kEnter}, U, 0, 0, false},
+    Case("NoRootGroup", kUserRootSaved, kGroupOnly)
+        .makes({kG0})
+        .logs({kGroupDenied, kEnter})
+        .unread(),
+    Case("NoRootUser", kUserOnly, kGroupRootSaved)
+        .makes({kG0, kU0, kGBack})
+        .logs({kRaisedGroup, kUserDenied, kEnter})
+        .unread(),
+    Case("NoRootUserRootGroup", kUserOnly, kRootAll)
+        .makes({kU0})
+        .logs({kUserDenied, kEnter})
+        .unread(),
 
     // Each call of the usual case fails once.
-    {"FirstFails",
-     kUserRootSaved,
-     kGroupRootSaved,
-     1,
-     {kG0},
-     {{kError, "ERROR: setresgid(-1, 0, -1) [Resource temporarily unavailable]"}, kEnter},
-     U,
-     G,
-     0,
-     false},
-    {"SecondFails",
-     kUserRootSaved,
-     kGroupRootSaved,
-     2,
-     {kG0, kU0, kGBack},
-     {kRaisedGroup,
-      {kError, "ERROR: setresuid(-1, 0, -1) [Resource temporarily unavailable]"},
-      kEnter},
-     U,
-     G,
-     0,
-     false},
-    {"ThirdFails",
-     kUserRootSaved,
-     kGroupRootSaved,
-     3,
-     {kG0, kU0, kU0},
-     {kRaisedGroup,
-      kRaisedUser,
-      {kError, "ERROR: setresuid(-1, 0, -1) [Resource temporarily unavailable]"},
-      kLeave},
-     0,
-     0,
-     EPERM,
-     true},
+    Case("FirstFails", kUserRootSaved, kGroupRootSaved)
+        .failing(1)
+        .makes({kG0})
+        .logs({{kError, "ERROR: setresgid(-1, 0, -1) [Resource temporarily unavailable]"}, kEnter})
+        .unread(),
+    Case("SecondFails", kUserRootSaved, kGroupRootSaved)
+        .failing(2)
+        .makes({kG0, kU0, kGBack})
+        .logs({kRaisedGroup,
+               {kError, "ERROR: setresuid(-1, 0, -1) [Resource temporarily unavailable]"},
+               kEnter})
+        .unread(),
+    Case("ThirdFails", kUserRootSaved, kGroupRootSaved)
+        .failing(3)
+        .makes({kG0, kU0, kU0})
+        .logs({kRaisedGroup,
+               kRaisedUser,
+               {kError, "ERROR: setresuid(-1, 0, -1) [Resource temporarily unavailable]"},
+               kLeave})
+        .endsAs(0, 0)
+        .denied(),
     // The user is not restored once the group could not be.
-    {"FourthFails",
-     kUserRootSaved,
-     kGroupRootSaved,
-     4,
-     {kG0, kU0, kU0, kGBack},
-     {kRaisedGroup,
-      kRaisedUser,
-      kRaisedUser,
-      {kError, "ERROR: setresgid(-1, 2002, -1) [Resource temporarily unavailable]"},
-      kLeave},
-     0,
-     0,
-     EPERM,
-     true},
-    {"FifthFails",
-     kUserRootSaved,
-     kGroupRootSaved,
-     5,
-     kWhole,
-     {kRaisedGroup,
-      kRaisedUser,
-      kRaisedUser,
-      {kError, "ERROR: setresuid(-1, 1001, -1) [Resource temporarily unavailable]"},
-      kLeave},
-     0,
-     G,
-     EPERM,
-     true},
+    Case("FourthFails", kUserRootSaved, kGroupRootSaved)
+        .failing(4)
+        .makes({kG0, kU0, kU0, kGBack})
+        .logs({kRaisedGroup,
+               kRaisedUser,
+               kRaisedUser,
+               {kError, "ERROR: setresgid(-1, 2002, -1) [Resource temporarily unavailable]"},
+               kLeave})
+        .endsAs(0, 0)
+        .denied(),
+    Case("FifthFails", kUserRootSaved, kGroupRootSaved)
+        .failing(5)
+        .makes(kWhole)
+        .logs({kRaisedGroup,
+               kRaisedUser,
+               kRaisedUser,
+               {kError, "ERROR: setresuid(-1, 1001, -1) [Resource temporarily unavailable]"},
+               kLeave})
+        .endsAs(0, G)
+        .denied(),
 
     // And those of a process where one of the ids is root's already.
-    {"GroupAloneCannotReturn",
-     kRootAll,
-     kGroupRootSaved,
-     2,
-     {kG0, kGBack},
-     {kRaisedGroup,
-      {kError, "ERROR: setresgid(-1, 2002, -1) [Resource temporarily unavailable]"},
-      kLeave},
-     0,
-     0,
-     EPERM,
-     true},
-    {"UserAloneCannotReturn",
-     kUserRootSaved,
-     kRootAll,
-     3,
-     {kU0, kU0, kUBack},
-     {kRaisedUser,
-      kRaisedUser,
-      {kError, "ERROR: setresuid(-1, 1001, -1) [Resource temporarily unavailable]"},
-      kLeave},
-     0,
-     0,
-     EPERM,
-     true},
-    {"GroupIsStuckAfterTheUserFailed",
-     kUserOnly,
-     kGroupRootSaved,
-     3,
-     {kG0, kU0, kGBack},
-     {kRaisedGroup,
-      kUserDenied,
-      kEnter,
-      {kError, "ERROR: setresgid(-1, 2002, -1) [Resource temporarily unavailable]"},
-      kLeave},
-     U,
-     0,
-     EPERM,
-     false},
+    Case("GroupAloneCannotReturn", kRootAll, kGroupRootSaved)
+        .failing(2)
+        .makes({kG0, kGBack})
+        .logs({kRaisedGroup,
+               {kError, "ERROR: setresgid(-1, 2002, -1) [Resource temporarily unavailable]"},
+               kLeave})
+        .endsAs(0, 0)
+        .denied(),
+    Case("UserAloneCannotReturn", kUserRootSaved, kRootAll)
+        .failing(3)
+        .makes({kU0, kU0, kUBack})
+        .logs({kRaisedUser,
+               kRaisedUser,
+               {kError, "ERROR: setresuid(-1, 1001, -1) [Resource temporarily unavailable]"},
+               kLeave})
+        .endsAs(0, 0)
+        .denied(),
+    Case("GroupIsStuckAfterTheUserFailed", kUserOnly, kGroupRootSaved)
+        .failing(3)
+        .makes({kG0, kU0, kGBack})
+        .logs({kRaisedGroup,
+               kUserDenied,
+               kEnter,
+               {kError, "ERROR: setresgid(-1, 2002, -1) [Resource temporarily unavailable]"},
+               kLeave})
+        .unread()
+        .endsAs(U, 0)
+        .denied(),
 };
 
 std::vector<test::Expected> linesOf(const Unit& unit, const std::vector<Line>& lines) {
@@ -279,7 +257,7 @@ TEST_P(Guard, ChangesTheEffectiveIdsAndPutsThemBack) {
   test::writeConfig(unit.config, unit.text);
   test::runAs(expected.user, expected.group, [&, &unit = unit, &expected = expected] {
     test::IdsSpy spy;
-    spy.failing = expected.failing;
+    spy.failing = expected.failingChange;
     spy.error = EAGAIN;
     test::Log log;
     const Outcome outcome(unit, &spy);

@@ -23,18 +23,26 @@ unsigned append(void* data, unsigned size, unsigned count, void* userData) {
   return size * count;
 }
 
-// 10002 URL, 10015 POSTFIELDS, 20011 WRITEFUNCTION, 10001 WRITEDATA, 81 SSL_VERIFYHOST,
-// 64 SSL_VERIFYPEER.
-const Calls kGet = {"global_init 3", "easy_init", "setopt 10002", "setopt 20011",
-                    "setopt 10001",  "perform",   "easy_cleanup", "global_cleanup"};
-const Calls kGetUnverified = {"global_init 3", "easy_init",     "setopt 10002", "setopt 20011",
-                              "setopt 10001",  "setopt 81",     "setopt 64",    "perform",
-                              "easy_cleanup",  "global_cleanup"};
-const Calls kPost = {"global_init 3", "easy_init", "setopt 10002", "setopt 10015",  "setopt 20011",
-                     "setopt 10001",  "perform",   "easy_cleanup", "global_cleanup"};
-const Calls kPostUnverified = {"global_init 3", "easy_init",    "setopt 10002",  "setopt 10015",
-                               "setopt 20011",  "setopt 10001", "setopt 81",     "setopt 64",
-                               "perform",       "easy_cleanup", "global_cleanup"};
+const Calls kGet = {"global_init 3",    "easy_init", "setopt URL",   "setopt WRITEFUNCTION",
+                    "setopt WRITEDATA", "perform",   "easy_cleanup", "global_cleanup"};
+const Calls kGetUnverified = {"global_init 3",         "easy_init",        "setopt URL",
+                              "setopt WRITEFUNCTION",  "setopt WRITEDATA", "setopt SSL_VERIFYHOST",
+                              "setopt SSL_VERIFYPEER", "perform",          "easy_cleanup",
+                              "global_cleanup"};
+const Calls kPost = {"global_init 3",        "easy_init",        "setopt URL", "setopt POSTFIELDS",
+                     "setopt WRITEFUNCTION", "setopt WRITEDATA", "perform",    "easy_cleanup",
+                     "global_cleanup"};
+const Calls kPostUnverified = {"global_init 3",
+                               "easy_init",
+                               "setopt URL",
+                               "setopt POSTFIELDS",
+                               "setopt WRITEFUNCTION",
+                               "setopt WRITEDATA",
+                               "setopt SSL_VERIFYHOST",
+                               "setopt SSL_VERIFYPEER",
+                               "perform",
+                               "easy_cleanup",
+                               "global_cleanup"};
 
 struct Way {
   const char* name;

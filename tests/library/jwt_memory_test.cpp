@@ -33,7 +33,7 @@ using test::throws;
 // Calls `attempt` with the first, the second, ... allocation failing, until there is no further
 // one. Returns how many there were.
 template <typename Attempt>
-int FailEachAllocation(const Attempt& attempt) {
+int failEachAllocation(const Attempt& attempt) {
   for (int nth = 1; nth < 100; ++nth) {
     bool hit = false;
     testing::AssertionResult result = testing::AssertionSuccess();
@@ -51,9 +51,9 @@ int FailEachAllocation(const Attempt& attempt) {
 TEST(JwtWithoutMemory, ReadsNoHeaderAndNoBody) {
   test::Log log;
   Jwt jwt("e30.e30.sig");
-  EXPECT_EQ(FailEachAllocation([&] { return throws<std::logic_error>([&] { jwt.GetHeader(); }); }),
+  EXPECT_EQ(failEachAllocation([&] { return throws<std::logic_error>([&] { jwt.GetHeader(); }); }),
             1);
-  EXPECT_EQ(FailEachAllocation([&] { return throws<std::logic_error>([&] { jwt.GetBody(); }); }),
+  EXPECT_EQ(failEachAllocation([&] { return throws<std::logic_error>([&] { jwt.GetBody(); }); }),
             1);
   EXPECT_EQ(jwt.GetBody(), Json::Value(Json::objectValue));
   EXPECT_TRUE(log.isEmpty());
@@ -69,7 +69,7 @@ TEST(JwtWithoutMemory, FailsTheRsaCheckSilently) {
     return throws<jwt_verify_failed>("verify rsa signature failed",
                                      [&] { jwt.JwtRSAVerify(n, e, EVP_sha256()); });
   };
-  EXPECT_EQ(FailEachAllocation(attempt), 3) << "modulus, exponent, signature";
+  EXPECT_EQ(failEachAllocation(attempt), 3) << "modulus, exponent, signature";
   EXPECT_NO_THROW(jwt.JwtRSAVerify(n, e, EVP_sha256()));
   EXPECT_TRUE(log.isEmpty());
 }
@@ -82,7 +82,7 @@ TEST(JwtWithoutMemory, FailsTheHmacCheck) {
     return throws<jwt_verify_failed>("verify hmac signature failed",
                                      [&] { jwt.JwtHMACVerify(key, EVP_sha256()); });
   };
-  EXPECT_GE(FailEachAllocation(attempt), 1) << "the key";
+  EXPECT_GE(failEachAllocation(attempt), 1) << "the key";
   EXPECT_NO_THROW(jwt.JwtHMACVerify(key, EVP_sha256()));
   EXPECT_TRUE(log.isEmpty());
 }

@@ -59,7 +59,7 @@ const std::string kFrodo =
     "IG1pZ2h0IGJlIHN3ZXB0IG9mZiB0by4";
 
 // A text with the character at `at` changed in its highest bit, so that no decoder overlooks it.
-std::string Changed(std::string text, size_t at) {
+std::string changed(std::string text, size_t at) {
   const std::string alphabet = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789-_";
   text[at] = alphabet[alphabet.find(text[at]) ^ 32];
   return text;
@@ -67,32 +67,32 @@ std::string Changed(std::string text, size_t at) {
 
 class JwtSignature : public testing::Test {
  protected:
-  static void VerifyRsa(const std::string& token, std::string n, std::string e,
+  static void verifyRsa(const std::string& token, std::string n, std::string e,
                         const EVP_MD* md = EVP_sha256()) {
     Jwt(token).JwtRSAVerify(n, e, md);
   }
 
-  static void VerifyHmac(const std::string& token, std::string key,
+  static void verifyHmac(const std::string& token, std::string key,
                          const EVP_MD* md = EVP_sha256()) {
     Jwt(token).JwtHMACVerify(key, md);
   }
 
   // Each refusal is checked together with what it wrote to the log.
-  void ExpectRsaRefused(const std::string& token, const std::string& n, const std::string& e,
+  void expectRsaRefused(const std::string& token, const std::string& n, const std::string& e,
                         const std::vector<test::Expected>& lines, const EVP_MD* md = EVP_sha256()) {
     log.clear();
-    EXPECT_TRUE(throws<jwt_verify_failed>(kRsaFailed, [&] { VerifyRsa(token, n, e, md); }));
+    EXPECT_TRUE(throws<jwt_verify_failed>(kRsaFailed, [&] { verifyRsa(token, n, e, md); }));
     EXPECT_TRUE(log.is(lines));
     log.clear();
   }
 
-  void ExpectHmacRefused(const std::string& token, const std::string& key,
+  void expectHmacRefused(const std::string& token, const std::string& key,
                          const EVP_MD* md = EVP_sha256()) {
-    EXPECT_TRUE(throws<jwt_verify_failed>(kHmacFailed, [&] { VerifyHmac(token, key, md); }));
+    EXPECT_TRUE(throws<jwt_verify_failed>(kHmacFailed, [&] { verifyHmac(token, key, md); }));
   }
 
   // The body above all: the signed text is put together in its place.
-  static void ExpectUntouched(Jwt& jwt, const std::string& token) {
+  static void expectUntouched(Jwt& jwt, const std::string& token) {
     Jwt untouched(token);
     EXPECT_EQ(jwt.GetHeader(), untouched.GetHeader());
     EXPECT_EQ(jwt.GetBody(), untouched.GetBody());
@@ -121,7 +121,7 @@ struct Algorithm {
 const Algorithm kAlgorithms[] = {{"256", EVP_sha256}, {"384", EVP_sha384}, {"512", EVP_sha512}};
 
 TEST_F(JwtRsa, VerifiesTheTokenOfRfc7515) {
-  EXPECT_NO_THROW(VerifyRsa(token, kModulus, kExponent));
+  EXPECT_NO_THROW(verifyRsa(token, kModulus, kExponent));
 }
 
 TEST_F(JwtRsa, VerifiesTheTokenOfRfc7520) {
@@ -141,7 +141,7 @@ TEST_F(JwtRsa, VerifiesTheTokenOfRfc7520) {
       "Ro4QPocSadnHXFxnt8Is9UzpERV0ePPQdLuW3IS_de3xyIrDaLGdjluPxUAhb6L2"
       "aXic1U12podGU0KLUQSE_oI-ZnmKJ3F4uOZDnd6QZWJushZ41Axf_fcIe8u9ipH8"
       "4ogoree7vjbU5y18kDquDg";
-  EXPECT_NO_THROW(VerifyRsa(header + "." + kFrodo + "." + signature, n, "AQAB"));
+  EXPECT_NO_THROW(verifyRsa(header + "." + kFrodo + "." + signature, n, "AQAB"));
 }
 
 TEST_F(JwtRsa, VerifiesUnderTheDigestOfTheSignatureAlone) {
@@ -152,9 +152,9 @@ TEST_F(JwtRsa, VerifiesUnderTheDigestOfTheSignatureAlone) {
     for (const Algorithm& reader : kAlgorithms) {
       SCOPED_TRACE(std::string(signer.number) + " read as " + reader.number);
       if (signer.md == reader.md) {
-        EXPECT_NO_THROW(VerifyRsa(signed_token, key.n(), key.e(), reader.md()));
+        EXPECT_NO_THROW(verifyRsa(signed_token, key.n(), key.e(), reader.md()));
       } else {
-        ExpectRsaRefused(signed_token, key.n(), key.e(), kFinalFailed, reader.md());
+        expectRsaRefused(signed_token, key.n(), key.e(), kFinalFailed, reader.md());
       }
     }
   }
@@ -163,13 +163,13 @@ TEST_F(JwtRsa, VerifiesUnderTheDigestOfTheSignatureAlone) {
 TEST_F(JwtRsa, VerifiesUnderKeysOfOtherSizes) {
   for (int bits : {1024, 1536, 3072}) {
     const test::RsaKey key(bits);
-    EXPECT_NO_THROW(VerifyRsa(test::rsaToken(key, "{}", "{}"), key.n(), key.e())) << bits;
+    EXPECT_NO_THROW(verifyRsa(test::rsaToken(key, "{}", "{}"), key.n(), key.e())) << bits;
   }
 }
 
 TEST_F(JwtRsa, IgnoresZeroBytesInFrontOfTheNumbers) {
   const std::string zero(1, '\0');
-  EXPECT_NO_THROW(VerifyRsa(token, base64url(zero + test::fromBase64(kModulus)),
+  EXPECT_NO_THROW(verifyRsa(token, base64url(zero + test::fromBase64(kModulus)),
                             base64url(zero + test::fromBase64(kExponent))));
 }
 
@@ -177,7 +177,7 @@ TEST_F(JwtRsa, ReadsNumbersAndSignatureInStandardBase64AsWell) {
   const std::string padded =
       kRsaHeader + "." + kPayload + "." + base64(test::fromBase64(kRsaSignature));
   ASSERT_NE(padded.find('='), std::string::npos);
-  EXPECT_NO_THROW(VerifyRsa(padded, base64(test::fromBase64(kModulus)), kExponent));
+  EXPECT_NO_THROW(verifyRsa(padded, base64(test::fromBase64(kModulus)), kExponent));
 }
 
 TEST_F(JwtRsa, LeavesItsArgumentsAndTheTokenAlone) {
@@ -188,24 +188,24 @@ TEST_F(JwtRsa, LeavesItsArgumentsAndTheTokenAlone) {
   EXPECT_NO_THROW(jwt.JwtRSAVerify(n, e, EVP_sha256())) << "a second time";
   EXPECT_EQ(n, kModulus);
   EXPECT_EQ(e, kExponent);
-  ExpectUntouched(jwt, token);
+  expectUntouched(jwt, token);
 }
 
 TEST_F(JwtRsa, RefusesAChangeOfAnyCharacter) {
   for (size_t at = 0; at < token.size(); ++at) {
     if (token[at] == '.') continue;
     SCOPED_TRACE(at);
-    ExpectRsaRefused(Changed(token, at), kModulus, kExponent, kFinalFailed);
+    expectRsaRefused(changed(token, at), kModulus, kExponent, kFinalFailed);
   }
 }
 
 TEST_F(JwtRsa, RefusesTheSignatureOfAnotherText) {
-  ExpectRsaRefused(kHmacHeader + "." + kPayload + "." + kRsaSignature, kModulus, kExponent,
+  expectRsaRefused(kHmacHeader + "." + kPayload + "." + kRsaSignature, kModulus, kExponent,
                    kFinalFailed);
 }
 
 TEST_F(JwtRsa, RefusesAnotherKey) {
-  ExpectRsaRefused(token, test::anyRsaKey().n(), test::anyRsaKey().e(), kFinalFailed);
+  expectRsaRefused(token, test::anyRsaKey().n(), test::anyRsaKey().e(), kFinalFailed);
 }
 
 TEST_F(JwtRsa, RefusesASignatureOfAnotherLength) {
@@ -213,28 +213,28 @@ TEST_F(JwtRsa, RefusesASignatureOfAnotherLength) {
   const std::string input = kRsaHeader + "." + kPayload + ".";
   for (const std::string& signature :
        {bytes.substr(1), bytes.substr(0, 255), bytes + '\0', '\0' + bytes, bytes + bytes})
-    ExpectRsaRefused(input + base64url(signature), kModulus, kExponent, kFinalFailed);
+    expectRsaRefused(input + base64url(signature), kModulus, kExponent, kFinalFailed);
 }
 
 // Something was decoded, if only nothing: the check runs, and says that it failed.
 TEST_F(JwtRsa, RefusesASignatureThatDoesNotDecode) {
   for (const char* signature : {"!!!!", "A", "====", "!"})
-    ExpectRsaRefused(kRsaHeader + "." + kPayload + "." + signature, kModulus, kExponent,
+    expectRsaRefused(kRsaHeader + "." + kPayload + "." + signature, kModulus, kExponent,
                      kFinalFailed);
 }
 
 TEST_F(JwtRsa, FailsSilentlyWithoutModulusExponentOrSignature) {
-  ExpectRsaRefused(token, "", kExponent, {});
-  ExpectRsaRefused(token, kModulus, "", {});
-  ExpectRsaRefused(kRsaHeader + "." + kPayload + ".", kModulus, kExponent, {});
+  expectRsaRefused(token, "", kExponent, {});
+  expectRsaRefused(token, kModulus, "", {});
+  expectRsaRefused(kRsaHeader + "." + kPayload + ".", kModulus, kExponent, {});
 }
 
 // Whether a number that is zero is noticed early or by the check itself is left open.
 TEST_F(JwtRsa, RefusesNumbersThatDoNotDecode) {
   for (const char* number : {"!!!!", "A", "====", "AA"}) {
     EXPECT_TRUE(
-        throws<jwt_verify_failed>(kRsaFailed, [&] { VerifyRsa(token, number, kExponent); }));
-    EXPECT_TRUE(throws<jwt_verify_failed>(kRsaFailed, [&] { VerifyRsa(token, kModulus, number); }));
+        throws<jwt_verify_failed>(kRsaFailed, [&] { verifyRsa(token, number, kExponent); }));
+    EXPECT_TRUE(throws<jwt_verify_failed>(kRsaFailed, [&] { verifyRsa(token, kModulus, number); }));
   }
   EXPECT_LE(log.lines().size(), 8u);
   log.clear();
@@ -244,7 +244,7 @@ TEST_F(JwtRsa, RefusesWhatTheDecoderCannotRead) {
   for (int nth : {1, 2, 3}) {
     test::Fault fault("BIO_read", nth);
     EXPECT_TRUE(
-        throws<jwt_verify_failed>(kRsaFailed, [&] { VerifyRsa(token, kModulus, kExponent); }));
+        throws<jwt_verify_failed>(kRsaFailed, [&] { verifyRsa(token, kModulus, kExponent); }));
     EXPECT_TRUE(fault.wasHit());
   }
   EXPECT_LE(log.lines().size(), 3u);
@@ -256,11 +256,11 @@ TEST_F(JwtRsa, EndsEachTextAtAZeroByte) {
   const test::RsaKey& key = test::anyRsaKey();
   const std::string behind("\0behind", 7);
   const std::string cut = "e30" + behind + ".e30." + base64url(key.sign("e30", "SHA256"));
-  EXPECT_NO_THROW(VerifyRsa(cut, key.n(), key.e()));
-  EXPECT_NO_THROW(VerifyRsa(cut + behind, key.n() + behind, key.e() + behind));
+  EXPECT_NO_THROW(verifyRsa(cut, key.n(), key.e()));
+  EXPECT_NO_THROW(verifyRsa(cut + behind, key.n() + behind, key.e() + behind));
   const std::string whole =
       "e30" + behind + ".e30." + base64url(key.sign("e30" + behind + ".e30", "SHA256"));
-  ExpectRsaRefused(whole, key.n(), key.e(), kFinalFailed);
+  expectRsaRefused(whole, key.n(), key.e(), kFinalFailed);
 }
 
 struct Broken {
@@ -306,16 +306,16 @@ TEST_P(JwtRsaFault, EndsInTheOneMessage) {
   }
   EXPECT_TRUE(log.is(lines));
   log.clear();
-  ExpectUntouched(jwt, token);
+  expectUntouched(jwt, token);
   EXPECT_NO_THROW(jwt.JwtRSAVerify(n, e, EVP_sha256())) << "once the fault is over";
 }
 
 TEST_F(JwtHmac, VerifiesTheTokenOfRfc7515) {
-  EXPECT_NO_THROW(VerifyHmac(token, kHmacKey));
+  EXPECT_NO_THROW(verifyHmac(token, kHmacKey));
 }
 
 TEST_F(JwtHmac, VerifiesTheTokenOfRfc7520) {
-  EXPECT_NO_THROW(VerifyHmac(
+  EXPECT_NO_THROW(verifyHmac(
       "eyJhbGciOiJIUzI1NiIsImtpZCI6IjAxOGMwYWU1LTRkOWItNDcxYi1iZmQ2LWVlZjMxNGJjNzAzNyJ9." + kFrodo +
           ".s0h6KThzkfBBBkLspW1h84VsJZFTsPPqMDA7g1Md7p0",
       "hJtXIZ2uSN5kbQfbtTNWbpdmhkV8FJG-Onbc6mxCcYg"));
@@ -328,9 +328,9 @@ TEST_F(JwtHmac, VerifiesUnderTheDigestOfTheSignatureAlone) {
     for (const Algorithm& reader : kAlgorithms) {
       SCOPED_TRACE(std::string(signer.number) + " read as " + reader.number);
       if (signer.md == reader.md) {
-        EXPECT_NO_THROW(VerifyHmac(signed_token, base64url("secret"), reader.md()));
+        EXPECT_NO_THROW(verifyHmac(signed_token, base64url("secret"), reader.md()));
       } else {
-        ExpectHmacRefused(signed_token, base64url("secret"), reader.md());
+        expectHmacRefused(signed_token, base64url("secret"), reader.md());
       }
     }
   }
@@ -341,10 +341,10 @@ TEST_F(JwtHmac, VerifiesUnderKeysOfAnyBytesAndLength) {
     std::string key;
     while (key.size() < length) key += static_cast<char>(key.size() * 7);
     const std::string signed_token = test::hmacToken(key, "{}", "{}");
-    EXPECT_NO_THROW(VerifyHmac(signed_token, base64url(key))) << length;
-    EXPECT_NO_THROW(VerifyHmac(signed_token, base64(key))) << length;
+    EXPECT_NO_THROW(verifyHmac(signed_token, base64url(key))) << length;
+    EXPECT_NO_THROW(verifyHmac(signed_token, base64(key))) << length;
     key.back() = static_cast<char>(key.back() + 1);
-    ExpectHmacRefused(signed_token, base64url(key));
+    expectHmacRefused(signed_token, base64url(key));
   }
 }
 
@@ -354,14 +354,14 @@ TEST_F(JwtHmac, LeavesItsArgumentAndTheTokenAlone) {
   EXPECT_NO_THROW(jwt.JwtHMACVerify(key, EVP_sha256()));
   EXPECT_NO_THROW(jwt.JwtHMACVerify(key, EVP_sha256())) << "a second time";
   EXPECT_EQ(key, kHmacKey);
-  ExpectUntouched(jwt, token);
+  expectUntouched(jwt, token);
 }
 
 TEST_F(JwtHmac, RefusesAChangeOfAnyCharacter) {
   for (size_t at = 0; at < token.size(); ++at) {
     if (token[at] == '.') continue;
     SCOPED_TRACE(at);
-    ExpectHmacRefused(Changed(token, at), kHmacKey);
+    expectHmacRefused(changed(token, at), kHmacKey);
   }
 }
 
@@ -383,14 +383,14 @@ TEST_F(JwtHmac, RefusesOtherSpellingsOfTheRightSignature) {
        {other_case, kHmacSignature + "=", kHmacSignature + "==", plus, slash, unused_bits,
         kHmacSignature + "A", kHmacSignature.substr(0, 42), kHmacSignature + " ", std::string()}) {
     SCOPED_TRACE(signature);
-    ExpectHmacRefused(kHmacHeader + "." + kPayload + "." + signature, kHmacKey);
+    expectHmacRefused(kHmacHeader + "." + kPayload + "." + signature, kHmacKey);
   }
 }
 
 TEST_F(JwtHmac, AcceptsEverySignatureThatASignerMakes) {
   for (int i = 0; i < 300; ++i) {
     const std::string signed_token = test::hmacToken("secret", "{}", std::to_string(i), "HS512");
-    EXPECT_NO_THROW(VerifyHmac(signed_token, base64url("secret"), EVP_sha512())) << i;
+    EXPECT_NO_THROW(verifyHmac(signed_token, base64url("secret"), EVP_sha512())) << i;
   }
 }
 
@@ -399,8 +399,8 @@ TEST_F(JwtHmac, RefusesAKeyThatDecodesToNothing) {
   const std::string signed_token = test::hmacToken("", "{}", "{}");
   for (const char* key : {"", "!!!!", "!", "A", "=", "\n"}) {
     SCOPED_TRACE(testing::PrintToString(key));
-    ExpectHmacRefused(signed_token, key);
-    ExpectHmacRefused(token, key);
+    expectHmacRefused(signed_token, key);
+    expectHmacRefused(token, key);
   }
 }
 
@@ -409,11 +409,11 @@ TEST_F(JwtHmac, EndsEachTextAtAZeroByte) {
   const std::string key = base64url("secret");
   const std::string cut =
       "e30" + behind + ".e30." + base64url(test::hmac("secret", "e30", "SHA256"));
-  EXPECT_NO_THROW(VerifyHmac(cut, key));
-  EXPECT_NO_THROW(VerifyHmac(cut + behind, key + behind));
+  EXPECT_NO_THROW(verifyHmac(cut, key));
+  EXPECT_NO_THROW(verifyHmac(cut + behind, key + behind));
   const std::string whole =
       "e30" + behind + ".e30." + base64url(test::hmac("secret", "e30" + behind + ".e30", "SHA256"));
-  ExpectHmacRefused(whole, key);
+  expectHmacRefused(whole, key);
 }
 
 class JwtHmacFault : public JwtHmac, public testing::WithParamInterface<Broken> {};
@@ -438,7 +438,7 @@ TEST_P(JwtHmacFault, EndsInTheOneMessage) {
         throws<jwt_verify_failed>(kHmacFailed, [&] { jwt.JwtHMACVerify(key, EVP_sha256()); }));
     EXPECT_TRUE(fault.wasHit());
   }
-  ExpectUntouched(jwt, token);
+  expectUntouched(jwt, token);
   EXPECT_NO_THROW(jwt.JwtHMACVerify(key, EVP_sha256())) << "once the fault is over";
 }
 
@@ -446,7 +446,7 @@ TEST_P(JwtHmacFault, EndsInTheOneMessage) {
 TEST_F(JwtHmac, RefusesAnEmptySignatureWhenNoMacIsMade) {
   for (const char* function : {"BIO_new", "HMAC", "BIO_write"}) {
     test::Fault fault(function, std::string(function) == "BIO_new" ? 2 : 1);
-    ExpectHmacRefused(kHmacHeader + "." + kPayload + ".", kHmacKey);
+    expectHmacRefused(kHmacHeader + "." + kPayload + ".", kHmacKey);
     EXPECT_TRUE(fault.wasHit()) << function;
   }
 }

@@ -38,14 +38,14 @@ void PrintTo(const Part& part, std::ostream* out) {
 
 class JwtPart : public testing::TestWithParam<Part> {
  protected:
-  static Json::Value Get(const std::string& segment) {
+  static Json::Value get(const std::string& segment) {
     Jwt jwt(GetParam().token(segment));
     return (jwt.*GetParam().get)();
   }
 
-  static void ExpectRefused(const std::string& segment) {
+  static void expectRefused(const std::string& segment) {
     SCOPED_TRACE(testing::PrintToString(segment));
-    EXPECT_TRUE(throws<std::invalid_argument>(GetParam().message, [&] { Get(segment); }));
+    EXPECT_TRUE(throws<std::invalid_argument>(GetParam().message, [&] { get(segment); }));
   }
 
   void TearDown() override { EXPECT_TRUE(log.isEmpty()); }
@@ -121,7 +121,7 @@ TEST_P(JwtPart, IsReadTwiceAlike) {
 TEST_P(JwtPart, IsReadAtEveryLength) {
   for (size_t length = 0; length <= 1200; ++length) {
     const std::string text(length, 'x');
-    ASSERT_EQ(Get(base64url("{\"a\":\"" + text + "\"}"))["a"], text) << length;
+    ASSERT_EQ(get(base64url("{\"a\":\"" + text + "\"}"))["a"], text) << length;
   }
 }
 
@@ -129,15 +129,15 @@ TEST_P(JwtPart, OfOneCharacterMoreThanAFullGroupIsRefused) {
   for (const char* text : {"", "123", R"({"a":123})", R"({"a":"xy"}  )", R"({"a":"xy", "b":23})"}) {
     const std::string segment = base64url(text);
     ASSERT_EQ(segment.size() % 4, 0u) << text;
-    for (const char* extra : {"A", "g", "0", "-", "_", "=", "!"}) ExpectRefused(segment + extra);
+    for (const char* extra : {"A", "g", "0", "-", "_", "=", "!"}) expectRefused(segment + extra);
   }
 }
 
 TEST_P(JwtPart, InStandardBase64IsReadAsWell) {
-  EXPECT_EQ(Get("eyJhIjoxfQ")["a"], 1);
-  EXPECT_EQ(Get("eyJhIjoxfQ==")["a"], 1);
-  EXPECT_EQ(Get("eyJhIjoxMn0")["a"], 12);
-  EXPECT_EQ(Get("eyJhIjoxMn0=")["a"], 12);
+  EXPECT_EQ(get("eyJhIjoxfQ")["a"], 1);
+  EXPECT_EQ(get("eyJhIjoxfQ==")["a"], 1);
+  EXPECT_EQ(get("eyJhIjoxMn0")["a"], 12);
+  EXPECT_EQ(get("eyJhIjoxMn0=")["a"], 12);
   // "-" and "_", "+" and "/", and both kinds in one text.
   const std::string text = "\"\xc3\xbb\xc3\xbf\xc3\xbe\xc3\xbf\xc3\xbe~?~?>>??\"";
   std::string url = base64url(text);
@@ -149,7 +149,7 @@ TEST_P(JwtPart, InStandardBase64IsReadAsWell) {
   mixed[mixed.find('-')] = '+';
   const std::string content = text.substr(1, text.size() - 2);
   for (const std::string& segment : {url, standard, mixed})
-    EXPECT_EQ(Get(segment).asString(), content) << segment;
+    EXPECT_EQ(get(segment).asString(), content) << segment;
 }
 
 // Every pair of characters stands for one byte; what that is as JSON, the reader says.
@@ -163,10 +163,10 @@ TEST_P(JwtPart, OfTwoCharactersIsTheByteTheyStandFor) {
       Json::Value expected;
       // What follows a zero byte is not part of the text.
       if (!Json::Reader().parse(byte.c_str(), expected)) {
-        ASSERT_THROW(Get(segment), std::invalid_argument) << segment;
+        ASSERT_THROW(get(segment), std::invalid_argument) << segment;
         continue;
       }
-      ASSERT_EQ(Get(segment), expected) << segment;
+      ASSERT_EQ(get(segment), expected) << segment;
       ++read;
     }
   }
@@ -174,70 +174,70 @@ TEST_P(JwtPart, OfTwoCharactersIsTheByteTheyStandFor) {
 }
 
 TEST_P(JwtPart, NeedNotBeAnObject) {
-  EXPECT_EQ(Get(base64url("null")), Json::Value());
-  EXPECT_EQ(Get(base64url("[]")), Json::Value(Json::arrayValue));
-  EXPECT_EQ(Get(base64url("[1,2]"))[1], 2);
-  EXPECT_EQ(Get(base64url("502")), 502);
-  EXPECT_EQ(Get(base64url("\"text\"")), "text");
-  EXPECT_EQ(Get(base64url("true")), true);
+  EXPECT_EQ(get(base64url("null")), Json::Value());
+  EXPECT_EQ(get(base64url("[]")), Json::Value(Json::arrayValue));
+  EXPECT_EQ(get(base64url("[1,2]"))[1], 2);
+  EXPECT_EQ(get(base64url("502")), 502);
+  EXPECT_EQ(get(base64url("\"text\"")), "text");
+  EXPECT_EQ(get(base64url("true")), true);
 }
 
 TEST_P(JwtPart, ThatIsNotJsonIsRefused) {
   for (const char* text : {"{", "{\"a\":", "nul", "hello", "<html>", "\xff\xfe", "[1,", "\"open"})
-    ExpectRefused(base64url(text));
+    expectRefused(base64url(text));
 }
 
 TEST_P(JwtPart, ThatIsNotBase64IsRefused) {
   for (const char* segment :
        {"!!!!", "!", "====", "=", "\xff\xff\xff\xff", "\n\n\n\n", "\n", "    "})
-    ExpectRefused(segment);
+    expectRefused(segment);
 }
 
 // Not one of the two messages: an absent text is not the same as a bad one.
 TEST_P(JwtPart, ThatIsEmptyIsALogicError) {
   for (const std::string& segment : {std::string(), std::string("\0eyJhIjoxfQ", 11)}) {
-    EXPECT_TRUE(throws<std::logic_error>([&] { Get(segment); }));
+    EXPECT_TRUE(throws<std::logic_error>([&] { get(segment); }));
   }
 }
 
 TEST_P(JwtPart, EndsAtAZeroByteOfTheSegment) {
-  EXPECT_EQ(Get(std::string("eyJhIjoxfQ\0!!!!", 15))["a"], 1);
+  EXPECT_EQ(get(std::string("eyJhIjoxfQ\0!!!!", 15))["a"], 1);
 }
 
 TEST_P(JwtPart, EndsAtAZeroByteOfTheDecodedText) {
-  EXPECT_EQ(Get(base64url(std::string("{\"a\":1}\0}}}}", 12)))["a"], 1);
-  ExpectRefused(base64url(std::string("{\"a\":\0 1}", 9)));
+  EXPECT_EQ(get(base64url(std::string("{\"a\":1}\0}}}}", 12)))["a"], 1);
+  expectRefused(base64url(std::string("{\"a\":\0 1}", 9)));
 }
 
 TEST_P(JwtPart, KeepsComments) {
-  const Json::Value value = Get(base64url("/* why */ {\"a\":1}"));
+  const Json::Value value = get(base64url("/* why */ {\"a\":1}"));
   EXPECT_EQ(value["a"], 1);
   EXPECT_EQ(value.getComment(Json::commentBefore), "/* why */");
 }
 
 TEST_P(JwtPart, NestedTooDeeplyIsRefused) {
-  EXPECT_TRUE(Get(base64url(std::string(1000, '[') + std::string(1000, ']'))).isArray());
-  ExpectRefused(base64url(std::string(1001, '[') + std::string(1001, ']')));
-  ExpectRefused(base64url(std::string(100000, '[')));
+  EXPECT_TRUE(get(base64url(std::string(1000, '[') + std::string(1000, ']'))).isArray());
+  expectRefused(base64url(std::string(1001, '[') + std::string(1001, ']')));
+  expectRefused(base64url(std::string(100000, '[')));
 }
 
 TEST_P(JwtPart, WithoutADecoderIsALogicError) {
   for (const char* function : {"BIO_new", "BIO_new_mem_buf", "BIO_pending"}) {
     test::Fault fault(function);
-    EXPECT_TRUE(throws<std::logic_error>([&] { Get("eyJhIjoxfQ"); })) << function;
+    EXPECT_TRUE(throws<std::logic_error>([&] { get("eyJhIjoxfQ"); })) << function;
     EXPECT_TRUE(fault.wasHit()) << function;
   }
 }
 
 TEST_P(JwtPart, ThatTheDecoderCannotReadIsRefused) {
   test::Fault fault("BIO_read");
-  ExpectRefused("eyJhIjoxfQ");
+  expectRefused("eyJhIjoxfQ");
   EXPECT_TRUE(fault.wasHit());
 }
 
 TEST_P(JwtPart, OfAMegabyteIsRead) {
   const std::string text(1 << 20, 'x');
-  EXPECT_EQ(Get(base64url("\"" + text + "\"")), text);
+  EXPECT_EQ(get(base64url("\"" + text + "\"")), text);
 }
 
 }  // namespace

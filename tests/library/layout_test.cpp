@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <cstddef>
+#include <cstring>
 #include <string>
 #include <type_traits>
 #include <typeinfo>
@@ -14,6 +15,7 @@
 #include "sso/profile.h"
 #include "sso/sso.h"
 #include "sso/webspheresso.h"
+#include "support/device.h"
 
 using namespace QOVA::SSO;
 using namespace QOVA::JWT;
@@ -24,23 +26,23 @@ constexpr bool k64 = sizeof(void*) == 8;
 
 // Sizes in bytes; the alignment is a pointer's for all of them.
 template <typename T>
-constexpr bool Is(std::size_t on64, std::size_t on32) {
+constexpr bool hasSize(std::size_t on64, std::size_t on32) {
   return sizeof(T) == (k64 ? on64 : on32) && alignof(T) == alignof(void*);
 }
 
-static_assert(Is<std::string>(32, 24), "another string class gives another interface");
-static_assert(Is<SSOClient>(304, 224));
-static_assert(Is<AzureSSOClient>(336, 248));
-static_assert(Is<WebSphereSSOClient>(304, 224));
-static_assert(Is<SSOProfile>(352, 256));
-static_assert(Is<Jwt>(96, 72));
-static_assert(Is<sso_exception>(16, 8));
-static_assert(Is<sso_err_resp>(16, 8));
-static_assert(Is<sso_op_failed>(16, 8));
-static_assert(Is<sso_not_implemented>(16, 8));
-static_assert(Is<jwt_exception>(16, 8));
-static_assert(Is<jwt_not_support>(16, 8));
-static_assert(Is<jwt_verify_failed>(16, 8));
+static_assert(hasSize<std::string>(32, 24), "another string class gives another interface");
+static_assert(hasSize<SSOClient>(304, 224));
+static_assert(hasSize<AzureSSOClient>(336, 248));
+static_assert(hasSize<WebSphereSSOClient>(304, 224));
+static_assert(hasSize<SSOProfile>(352, 256));
+static_assert(hasSize<Jwt>(96, 72));
+static_assert(hasSize<sso_exception>(16, 8));
+static_assert(hasSize<sso_err_resp>(16, 8));
+static_assert(hasSize<sso_op_failed>(16, 8));
+static_assert(hasSize<sso_not_implemented>(16, 8));
+static_assert(hasSize<jwt_exception>(16, 8));
+static_assert(hasSize<jwt_not_support>(16, 8));
+static_assert(hasSize<jwt_verify_failed>(16, 8));
 
 // The destructor entry that the base does not have and its children do.
 static_assert(std::is_polymorphic_v<SSOClient> && !std::has_virtual_destructor_v<SSOClient>);
@@ -66,6 +68,8 @@ class Fields : public SSOClient {
     }
   }
 
+  static_assert(std::is_same_v<decltype(enable), bool>);
+
  private:
   std::size_t offset(const void* field) const {
     return static_cast<std::size_t>(static_cast<const char*>(field) -
@@ -73,9 +77,29 @@ class Fields : public SSOClient {
   }
 };
 
+// The private field of that type at that place of an object.
+template <typename Field>
+const Field& fieldAt(const void* object, std::size_t offset) {
+  return *reinterpret_cast<const Field*>(static_cast<const char*>(object) + offset);
+}
+
+// The place of a virtual operation in the table, counted from 1: a pointer to it holds that.
+template <typename Member>
+std::size_t slotOf(Member member) {
+  std::ptrdiff_t parts[2];
+  static_assert(sizeof member == sizeof parts, "not the Itanium C++ ABI");
+  std::memcpy(parts, &member, sizeof parts);
+  // Where functions may have odd addresses, the mark of a virtual one stands in the other word.
+#if defined(__arm__) || defined(__aarch64__) || defined(__mips__)
+  return static_cast<std::size_t>(parts[0]) / sizeof(void*) + 1;
+#else
+  return static_cast<std::size_t>(parts[0] - 1) / sizeof(void*) + 1;
+#endif
+}
+
 // The one base class that the library's own type information names.
 template <typename T>
-const std::type_info* BaseOf() {
+const std::type_info* baseOf() {
   const auto* single = dynamic_cast<const abi::__si_class_type_info*>(&typeid(T));
   return single == nullptr ? nullptr : single->__base_type;
 }
@@ -83,8 +107,8 @@ const std::type_info* BaseOf() {
 template <typename T, typename Base>
 void expectBase() {
   static_assert(std::is_base_of_v<Base, T>);
-  ASSERT_NE(BaseOf<T>(), nullptr) << typeid(T).name();
-  EXPECT_TRUE(*BaseOf<T>() == typeid(Base)) << typeid(T).name();
+  ASSERT_NE(baseOf<T>(), nullptr) << typeid(T).name();
+  EXPECT_TRUE(*baseOf<T>() == typeid(Base)) << typeid(T).name();
 }
 
 template <typename T>
@@ -96,6 +120,51 @@ void expectNoBase() {
 
 TEST(Layout, FieldsOfTheBaseClassInTheirOrder) {
   Fields().expectOrder();
+}
+
+// Private fields are found by what they hold.
+TEST(Layout, FieldsOfAToken) {
+  const Jwt jwt("header.body.signature");
+  EXPECT_EQ(fieldAt<std::string>(&jwt, 0), "header");
+  EXPECT_EQ(fieldAt<std::string>(&jwt, sizeof(std::string)), "body");
+  EXPECT_EQ(fieldAt<std::string>(&jwt, 2 * sizeof(std::string)), "signature");
+}
+
+TEST(Layout, FieldOfTheAzureClient) {
+  test::writeConfig("azure.conf", R"({"azure_tenant_id":"the tenant"})");
+  const AzureSSOClient client;
+  EXPECT_EQ(fieldAt<std::string>(&client, sizeof(SSOClient)), "the tenant");
+}
+
+TEST(Layout, FieldsOfTheProfile) {
+  test::writeConfig("profile.conf", R"({"sso_enable":true, "sso_profile":"azure"})", 0644);
+  SSOProfile profile;
+  // First the field whose place the library gives away: a text in a wrong place cannot be read.
+  ASSERT_EQ(&fieldAt<SSOClient>(&profile, 2 * sizeof(void*) + sizeof(std::string)),
+            profile.GetSSOClient());
+  EXPECT_TRUE(fieldAt<bool>(&profile, sizeof(void*)));
+  EXPECT_EQ(fieldAt<std::string>(&profile, 2 * sizeof(void*)), "azure");
+}
+
+TEST(Layout, SlotsOfTheOperations) {
+  EXPECT_EQ(slotOf(&SSOClient::isEnable), 1u);
+  EXPECT_EQ(slotOf(&SSOClient::GetClientID), 2u);
+  EXPECT_EQ(slotOf(&SSOClient::GetClientSecret), 3u);
+  EXPECT_EQ(slotOf(&SSOClient::GetRedirectURI), 4u);
+  EXPECT_EQ(slotOf(&SSOClient::GetToken), 5u);
+  EXPECT_EQ(slotOf(&SSOClient::GetAuthEndpoint), 6u);
+  EXPECT_EQ(slotOf(&SSOClient::GetTokenEndpoint), 7u);
+  EXPECT_EQ(slotOf(&SSOClient::GetWellknownEndpoint), 8u);
+  EXPECT_EQ(slotOf(&SSOClient::GetLogoutEndpoint), 9u);
+  EXPECT_EQ(slotOf(&SSOClient::SetRedirectURI), 10u);
+  EXPECT_EQ(slotOf(&SSOClient::SetCode), 11u);
+  EXPECT_EQ(slotOf(&SSOClient::RequestWellknownInfo), 12u);
+  EXPECT_EQ(slotOf(&SSOClient::RequestTokenEndpoint), 13u);
+  EXPECT_EQ(slotOf(&SSOClient::VerifyIDToken), 14u);
+  EXPECT_EQ(slotOf(&SSOClient::GetIDTokenReqParams), 15u);
+  EXPECT_EQ(slotOf(&SSOClient::GetUserName), 16u);
+  EXPECT_EQ(slotOf(&SSOClient::ProcessTokenResponse), 17u);
+  EXPECT_EQ(slotOf(&SSOClient::OpenIDConnectLogin), 18u);
 }
 
 TEST(Layout, NamesOfTheTypes) {

@@ -32,18 +32,18 @@ class WebSphereVerify : public testing::Test {
 
   void TearDown() override { EXPECT_TRUE(log.isEmpty()); }
 
-  std::string Token(const std::string& algorithm = "HS256") const {
+  std::string token(const std::string& algorithm = "HS256") const {
     return test::hmacToken(secret, header.toStyledString(), body.toStyledString(), algorithm);
   }
 
   // Verifies a token as a device would that is configured with `secret`.
-  void Verify(const std::string& token) const {
+  void verify(const std::string& token) const {
     Json::Value file;
     file["websphere_client_id"] = "the device";
     file["websphere_client_secret"] = secret;
     test::writeConfig("websphere.conf", file.toStyledString());
     WebSphereSSOClient client;
-    Store(client, token);
+    store(client, token);
     struct Kept {
       ~Kept() { EXPECT_EQ(client.GetToken(), token); }
       WebSphereSSOClient& client;
@@ -52,7 +52,7 @@ class WebSphereVerify : public testing::Test {
     client.VerifyIDToken();
   }
 
-  static void Store(WebSphereSSOClient& client, const std::string& token) {
+  static void store(WebSphereSSOClient& client, const std::string& token) {
     Json::Value response;
     response["id_token"] = token;
     client.ProcessTokenResponse(response.toStyledString());
@@ -67,13 +67,13 @@ class WebSphereVerify : public testing::Test {
 TEST_F(WebSphereVerify, AcceptsTheThreeAlgorithms) {
   for (const char* algorithm : {"HS256", "HS384", "HS512"}) {
     header["alg"] = algorithm;
-    EXPECT_NO_THROW(Verify(Token(algorithm))) << algorithm;
+    EXPECT_NO_THROW(verify(token(algorithm))) << algorithm;
   }
 }
 
 TEST_F(WebSphereVerify, RefusesTheDigestOfAnotherAlgorithm) {
   header["alg"] = "HS512";
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(Token("HS256")); }));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(token("HS256")); }));
 }
 
 TEST_F(WebSphereVerify, RefusesEveryOtherAlgorithm) {
@@ -81,37 +81,37 @@ TEST_F(WebSphereVerify, RefusesEveryOtherAlgorithm) {
                                 "HS2560", " HS256", "HS256 ", "HS128"}) {
     header["alg"] = algorithm;
     EXPECT_TRUE(throws<jwt_not_support>(std::string(algorithm) + " algorithm is not supported",
-                                        [&] { Verify(Token()); }));
+                                        [&] { verify(token()); }));
   }
 }
 
 TEST_F(WebSphereVerify, NamesAnAlgorithmThatIsNoTextByItsText) {
   header["alg"] = 5;
-  EXPECT_TRUE(throws<jwt_not_support>("5 algorithm is not supported", [&] { Verify(Token()); }));
+  EXPECT_TRUE(throws<jwt_not_support>("5 algorithm is not supported", [&] { verify(token()); }));
   header["alg"] = Json::Value();
-  EXPECT_TRUE(throws<jwt_not_support>(" algorithm is not supported", [&] { Verify(Token()); }));
+  EXPECT_TRUE(throws<jwt_not_support>(" algorithm is not supported", [&] { verify(token()); }));
   header.removeMember("alg");
-  EXPECT_TRUE(throws<jwt_not_support>(" algorithm is not supported", [&] { Verify(Token()); }));
+  EXPECT_TRUE(throws<jwt_not_support>(" algorithm is not supported", [&] { verify(token()); }));
   for (const char* other : {"[]", "502", "null", "\"HS256\""}) {
     const std::string token = test::hmacToken(secret, other, body.toStyledString());
-    EXPECT_TRUE(throws<jwt_not_support>(" algorithm is not supported", [&] { Verify(token); }));
+    EXPECT_TRUE(throws<jwt_not_support>(" algorithm is not supported", [&] { verify(token); }));
   }
 }
 
 TEST_F(WebSphereVerify, RefusesAnotherSecretTextOrSignature) {
-  const std::string token = Token();
+  const std::string token = this->token();
   std::string other = token;
   other.back() = other.back() == 'A' ? 'B' : 'A';
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(other); }));
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(token + "="); }));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(other); }));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(token + "="); }));
   const std::string unsigned_token = token.substr(0, token.rfind('.') + 1);
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(unsigned_token); }));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(unsigned_token); }));
   body["admin"] = true;
   const std::string changed = test::signingInput(header.toStyledString(), body.toStyledString()) +
                               token.substr(token.rfind('.'));
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(changed); }));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(changed); }));
   secret = "S3cret";
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(token); }));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(token); }));
 }
 
 TEST_F(WebSphereVerify, TakesTheBytesOfTheSecretAsTheKey) {
@@ -122,7 +122,7 @@ TEST_F(WebSphereVerify, TakesTheBytesOfTheSecretAsTheKey) {
                                             "\xc3\xbb\xc3\xbf\xc3\xbe\xc3\xbf>>>???"};
   for (const std::string& key : secrets) {
     secret = key;
-    EXPECT_NO_THROW(Verify(Token())) << testing::PrintToString(secret);
+    EXPECT_NO_THROW(verify(token())) << testing::PrintToString(secret);
   }
   EXPECT_NE(test::base64(secret).find('+'), std::string::npos);
   EXPECT_NE(test::base64(secret).find('/'), std::string::npos);
@@ -130,18 +130,18 @@ TEST_F(WebSphereVerify, TakesTheBytesOfTheSecretAsTheKey) {
 
 TEST_F(WebSphereVerify, AcceptsASecretOf765Bytes) {
   secret = std::string(765, 's');
-  EXPECT_NO_THROW(Verify(Token()));
+  EXPECT_NO_THROW(verify(token()));
 }
 
 TEST_F(WebSphereVerify, RefusesASecretOf766Bytes) {
   secret = std::string(766, 's');
-  EXPECT_TRUE(throws<sso_op_failed>("encode base64 failed.", [&] { Verify(Token()); }));
+  EXPECT_TRUE(throws<sso_op_failed>("encode base64 failed.", [&] { verify(token()); }));
 }
 
 // Even for a token that is signed with the empty key.
 TEST_F(WebSphereVerify, RefusesAnEmptySecret) {
   secret = "";
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(Token()); }));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(token()); }));
 }
 
 TEST_F(WebSphereVerify, LooksAtNoOtherClaim) {
@@ -153,16 +153,16 @@ TEST_F(WebSphereVerify, LooksAtNoOtherClaim) {
   body["azp"] = "another";
   header["kid"].append("unknown");
   header["typ"] = "odd";
-  EXPECT_NO_THROW(Verify(Token()));
+  EXPECT_NO_THROW(verify(token()));
 }
 
 TEST_F(WebSphereVerify, ComparesTextsOfNumbersToo) {
   body["aud"] = 42;
-  EXPECT_TRUE(throws<std::invalid_argument>("client ID invalid", [&] { Verify(Token()); }));
+  EXPECT_TRUE(throws<std::invalid_argument>("client ID invalid", [&] { verify(token()); }));
   test::writeConfig("websphere.conf",
                     R"({"websphere_client_id":"42", "websphere_client_secret":"s3cret"})");
   WebSphereSSOClient client;
-  Store(client, Token());
+  store(client, token());
   EXPECT_NO_THROW(client.VerifyIDToken());
 }
 
@@ -172,28 +172,28 @@ TEST_F(WebSphereVerify, ReportsTheFirstOfManyFaults) {
   header["alg"] = "none";
   body["aud"] = "another";
   body["exp"] = 1;
-  EXPECT_TRUE(throws<std::invalid_argument>("token cannot be empty", [&] { Verify(""); }));
-  EXPECT_TRUE(throws<std::invalid_argument>("bad jwt format!", [&] { Verify("!!!!.!!!!"); }));
+  EXPECT_TRUE(throws<std::invalid_argument>("token cannot be empty", [&] { verify(""); }));
+  EXPECT_TRUE(throws<std::invalid_argument>("bad jwt format!", [&] { verify("!!!!.!!!!"); }));
   EXPECT_TRUE(
-      throws<std::invalid_argument>("bad jwt header format!", [&] { Verify("!!!!.!!!!.!"); }));
-  EXPECT_TRUE(throws<std::invalid_argument>("bad jwt body format!", [&] { Verify("e30.!!!!.!"); }));
-  EXPECT_TRUE(throws<std::invalid_argument>("id_token expired.", [&] { Verify(Token() + "x"); }));
+      throws<std::invalid_argument>("bad jwt header format!", [&] { verify("!!!!.!!!!.!"); }));
+  EXPECT_TRUE(throws<std::invalid_argument>("bad jwt body format!", [&] { verify("e30.!!!!.!"); }));
+  EXPECT_TRUE(throws<std::invalid_argument>("id_token expired.", [&] { verify(token() + "x"); }));
   body["exp"] = Json::Int64{4102444800};
-  EXPECT_TRUE(throws<std::invalid_argument>("client ID invalid", [&] { Verify(Token() + "x"); }));
+  EXPECT_TRUE(throws<std::invalid_argument>("client ID invalid", [&] { verify(token() + "x"); }));
   body["aud"] = "the device";
   EXPECT_TRUE(
-      throws<jwt_not_support>("none algorithm is not supported", [&] { Verify(Token() + "x"); }));
+      throws<jwt_not_support>("none algorithm is not supported", [&] { verify(token() + "x"); }));
   header["alg"] = "HS256";
-  EXPECT_TRUE(throws<sso_op_failed>("encode base64 failed.", [&] { Verify(Token() + "x"); }));
+  EXPECT_TRUE(throws<sso_op_failed>("encode base64 failed.", [&] { verify(token() + "x"); }));
   secret = "s3cret";
-  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { Verify(Token() + "x"); }));
-  EXPECT_NO_THROW(Verify(Token()));
+  EXPECT_TRUE(throws<jwt_verify_failed>(kWrongSignature, [&] { verify(token() + "x"); }));
+  EXPECT_NO_THROW(verify(token()));
 }
 
 class WebSphereUser : public WebSphereVerify {
  protected:
-  void StoreClaims(const std::string& claims) {
-    Store(client, "!." + test::base64url(claims) + ".!");
+  void storeClaims(const std::string& claims) {
+    store(client, "!." + test::base64url(claims) + ".!");
   }
 
   WebSphereSSOClient client;
@@ -210,7 +210,7 @@ TEST_F(WebSphereUser, IsTheSubjectUnchanged) {
     claims["sub"] = name;
     claims["unique_name"] = "other@x";
     claims["email"] = "other@x";
-    StoreClaims(claims.toStyledString());
+    storeClaims(claims.toStyledString());
     client.GetUserName(user);
     EXPECT_EQ(user, name);
   }
@@ -221,7 +221,7 @@ TEST_F(WebSphereUser, WithoutASubjectThatIsTextIsRefused) {
        {"{}", R"({"sub":5})", R"({"sub":null})", R"({"sub":true})", R"({"sub":["alice"]})",
         R"({"sub":{"a":"b"}})", R"({"Sub":"alice"})", R"({"email":"a@b", "unique_name":"a@b"})",
         "null", "502", "[]", R"(["sub"])", R"("sub")"}) {
-    StoreClaims(claims);
+    storeClaims(claims);
     EXPECT_TRUE(throws<std::invalid_argument>("cannot find the user name!", [&] {
       client.GetUserName(user);
     })) << claims;
@@ -230,14 +230,14 @@ TEST_F(WebSphereUser, WithoutASubjectThatIsTextIsRefused) {
 }
 
 TEST_F(WebSphereUser, HasTheClaimsOfTheToken) {
-  StoreClaims(R"({"sub":"s", "list":[1,2]})");
+  storeClaims(R"({"sub":"s", "list":[1,2]})");
   const std::string token = client.GetToken();
   client.GetUserInfo(info);
   EXPECT_EQ(info["sub"], "s");
   EXPECT_EQ(info["list"][1], 2);
   EXPECT_EQ(info.size(), 2u);
   EXPECT_EQ(client.GetToken(), token);
-  StoreClaims("[7]");
+  storeClaims("[7]");
   client.GetUserInfo(info);
   EXPECT_EQ(info.size(), 1u) << "what was there is replaced";
   EXPECT_EQ(info[0], 7);
@@ -251,11 +251,11 @@ TEST_F(WebSphereUser, NeedsATokenThatCanBeRead) {
       {"e30.!!!!.s", "bad jwt body format!"},
       {"e30.A.s", "bad jwt body format!"}};
   for (const auto& [token, message] : cases) {
-    Store(client, token);
+    store(client, token);
     EXPECT_TRUE(throws<std::invalid_argument>(message, [&] { client.GetUserName(user); })) << token;
     EXPECT_TRUE(throws<std::invalid_argument>(message, [&] { client.GetUserInfo(info); })) << token;
   }
-  Store(client, "e30..s");
+  store(client, "e30..s");
   EXPECT_TRUE(throws<std::logic_error>([&] { client.GetUserName(user); }));
   EXPECT_TRUE(throws<std::logic_error>([&] { client.GetUserInfo(info); }));
   EXPECT_EQ(user, "before");

@@ -20,15 +20,15 @@ struct Encoded {
 };
 
 // The text of `source`, encoded into a buffer of `capacity`; writing behind it fails the test.
-Encoded Encode(const std::string& source, size_t capacity) {
+Encoded encode(const std::string& source, size_t capacity) {
   std::vector<char> buffer(capacity + 8, kUntouched);
   const int result = QOVABase64Encode(source.data(), source.size(), buffer.data(), capacity, 1);
   for (size_t i = capacity; i < buffer.size(); ++i) EXPECT_EQ(buffer[i], kUntouched) << capacity;
   return {result != 0, result != 0 ? buffer.data() : ""};
 }
 
-Encoded Encode(const std::string& source) {
-  return Encode(source, source.size() * 2 + 8);
+Encoded encode(const std::string& source) {
+  return encode(source, source.size() * 2 + 8);
 }
 
 struct Decoded {
@@ -36,7 +36,7 @@ struct Decoded {
   std::string bytes;
 };
 
-Decoded Decode(const std::string& text, size_t capacity) {
+Decoded decode(const std::string& text, size_t capacity) {
   std::vector<char> buffer(capacity + 8, kUntouched);
   size_t size = capacity;
   const bool ok = QOVABase64Decode(text.data(), text.size(), buffer.data(), &size) != 0;
@@ -45,8 +45,8 @@ Decoded Decode(const std::string& text, size_t capacity) {
   return {ok, ok ? std::string(buffer.data(), size) : ""};
 }
 
-Decoded Decode(const std::string& text) {
-  return Decode(text, text.size() + 8);
+Decoded decode(const std::string& text) {
+  return decode(text, text.size() + 8);
 }
 
 // RFC 4648, section 10.
@@ -58,7 +58,7 @@ const std::array<std::array<const char*, 2>, 7> kRfc4648 = {{{"", ""},
                                                              {"fooba", "Zm9vYmE="},
                                                              {"foobar", "Zm9vYmFy"}}};
 
-std::string OpenSSLEncode(const std::string& source) {
+std::string opensslEncode(const std::string& source) {
   std::vector<unsigned char> text(source.size() * 2 + 8);
   const int length =
       EVP_EncodeBlock(text.data(), reinterpret_cast<const unsigned char*>(source.data()),
@@ -68,7 +68,7 @@ std::string OpenSSLEncode(const std::string& source) {
 
 TEST(PlatformBase64Encode, GivesTheVectorsOfTheStandard) {
   for (const auto& [bytes, text] : kRfc4648) {
-    const Encoded encoded = Encode(bytes);
+    const Encoded encoded = encode(bytes);
     EXPECT_TRUE(encoded.ok) << bytes;
     EXPECT_EQ(encoded.text, text);
   }
@@ -77,10 +77,10 @@ TEST(PlatformBase64Encode, GivesTheVectorsOfTheStandard) {
 TEST(PlatformBase64Encode, AgreesWithOpenSSLOnAllInputsOfOneAndTwoBytes) {
   for (int first = 0; first < 256; ++first) {
     const std::string one(1, static_cast<char>(first));
-    ASSERT_EQ(Encode(one).text, OpenSSLEncode(one)) << first;
+    ASSERT_EQ(encode(one).text, opensslEncode(one)) << first;
     for (int second = 0; second < 256; ++second) {
       const std::string two = one + static_cast<char>(second);
-      ASSERT_EQ(Encode(two).text, OpenSSLEncode(two)) << first << ' ' << second;
+      ASSERT_EQ(encode(two).text, opensslEncode(two)) << first << ' ' << second;
     }
   }
 }
@@ -91,13 +91,13 @@ TEST(PlatformBase64Encode, WritesEveryLetterOfTheAlphabetAtEveryPlaceOfAGroup) {
       const unsigned group = bits << (18 - 6 * place);
       const std::string three = {static_cast<char>(group >> 16), static_cast<char>(group >> 8),
                                  static_cast<char>(group)};
-      ASSERT_EQ(Encode(three).text, OpenSSLEncode(three)) << place << ' ' << bits;
+      ASSERT_EQ(encode(three).text, opensslEncode(three)) << place << ' ' << bits;
     }
   }
 }
 
 TEST(PlatformBase64Encode, WritesNoLineBreaks) {
-  const std::string text = Encode(std::string(600, 'x')).text;
+  const std::string text = encode(std::string(600, 'x')).text;
   EXPECT_EQ(text.size(), 800u);
   EXPECT_EQ(text.find_first_of("\r\n"), std::string::npos);
 }
@@ -106,19 +106,19 @@ TEST(PlatformBase64Encode, NeedsRoomForTheTextAndItsZero) {
   for (size_t length = 0; length <= 12; ++length) {
     const size_t needed = (length + 2) / 3 * 4 + 1;
     for (size_t capacity = 0; capacity <= needed + 4; ++capacity)
-      EXPECT_EQ(Encode(std::string(length, 'x'), capacity).ok, capacity >= needed)
+      EXPECT_EQ(encode(std::string(length, 'x'), capacity).ok, capacity >= needed)
           << length << " bytes into " << capacity;
   }
 }
 
 TEST(PlatformBase64Encode, Fits765BytesInto1024) {
-  const Encoded encoded = Encode(std::string(765, 'x'), 1024);
+  const Encoded encoded = encode(std::string(765, 'x'), 1024);
   EXPECT_TRUE(encoded.ok);
   EXPECT_EQ(encoded.text.size(), 1020u);
 }
 
 TEST(PlatformBase64Encode, DoesNotFit766BytesInto1024) {
-  EXPECT_FALSE(Encode(std::string(766, 'x'), 1024).ok);
+  EXPECT_FALSE(encode(std::string(766, 'x'), 1024).ok);
 }
 
 TEST(PlatformBase64Encode, DoesNotDependOnTheOption) {
@@ -131,7 +131,7 @@ TEST(PlatformBase64Encode, DoesNotDependOnTheOption) {
 
 TEST(PlatformBase64Decode, ReadsTheVectorsOfTheStandard) {
   for (const auto& [bytes, text] : kRfc4648) {
-    const Decoded decoded = Decode(text);
+    const Decoded decoded = decode(text);
     EXPECT_TRUE(decoded.ok) << text;
     EXPECT_EQ(decoded.bytes, bytes);
   }
@@ -140,10 +140,10 @@ TEST(PlatformBase64Decode, ReadsTheVectorsOfTheStandard) {
 TEST(PlatformBase64Decode, ReadsBackAllInputsOfOneAndTwoBytes) {
   for (int first = 0; first < 256; ++first) {
     const std::string one(1, static_cast<char>(first));
-    ASSERT_EQ(Decode(OpenSSLEncode(one)).bytes, one) << first;
+    ASSERT_EQ(decode(opensslEncode(one)).bytes, one) << first;
     for (int second = 0; second < 256; ++second) {
       const std::string two = one + static_cast<char>(second);
-      ASSERT_EQ(Decode(OpenSSLEncode(two)).bytes, two) << first << ' ' << second;
+      ASSERT_EQ(decode(opensslEncode(two)).bytes, two) << first << ' ' << second;
     }
   }
 }
@@ -151,9 +151,9 @@ TEST(PlatformBase64Decode, ReadsBackAllInputsOfOneAndTwoBytes) {
 TEST(PlatformBase64Decode, NeedsRoomForTheBytesAlone) {
   for (size_t length = 0; length <= 12; ++length) {
     const std::string bytes(length, 'x');
-    const std::string text = OpenSSLEncode(bytes);
+    const std::string text = opensslEncode(bytes);
     for (size_t capacity = 0; capacity <= length + 4; ++capacity) {
-      const Decoded decoded = Decode(text, capacity);
+      const Decoded decoded = decode(text, capacity);
       EXPECT_EQ(decoded.ok, capacity >= length) << length << " bytes into " << capacity;
       if (decoded.ok) {
         EXPECT_EQ(decoded.bytes, bytes);
@@ -163,11 +163,11 @@ TEST(PlatformBase64Decode, NeedsRoomForTheBytesAlone) {
 }
 
 TEST(PlatformBase64Decode, FitsExactly1024BytesInto1024) {
-  EXPECT_TRUE(Decode(OpenSSLEncode(std::string(1024, 'x')), 1024).ok);
-  EXPECT_FALSE(Decode(OpenSSLEncode(std::string(1025, 'x')), 1024).ok);
+  EXPECT_TRUE(decode(opensslEncode(std::string(1024, 'x')), 1024).ok);
+  EXPECT_FALSE(decode(opensslEncode(std::string(1025, 'x')), 1024).ok);
 }
 
-bool InAlphabet(char c) {
+bool inAlphabet(char c) {
   return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') || c == '+' ||
          c == '/';
 }
@@ -179,15 +179,15 @@ TEST(PlatformBase64Decode, RefusesEveryCharacterOutsideTheAlphabetAtEveryPlace) 
       std::string text = "Zm9vYmFy";
       text[at] = static_cast<char>(value);
       const bool padding = text[at] == '=' && at == 7;
-      EXPECT_EQ(Decode(text).ok, InAlphabet(text[at]) || padding) << at << ' ' << value;
+      EXPECT_EQ(decode(text).ok, inAlphabet(text[at]) || padding) << at << ' ' << value;
     }
   }
 }
 
 // Four characters stand for 3, 2 or 1 bytes, as the padding says; other forms are refused.
-size_t BytesOfGroup(const std::string& group) {
+size_t bytesOfGroup(const std::string& group) {
   size_t letters = 0;
-  while (letters < 4 && InAlphabet(group[letters])) ++letters;
+  while (letters < 4 && inAlphabet(group[letters])) ++letters;
   const bool ok = letters >= 2 && group.find_first_not_of('=', letters) == std::string::npos;
   return ok ? letters - 1 : 0;
 }
@@ -199,18 +199,18 @@ TEST(PlatformBase64Decode, AcceptsPaddingAtTheEndAloneOverAllShortTexts) {
     for (char c : letters) texts.push_back(texts[i] + c);
   }
   for (const std::string& text : texts) {
-    const bool valid = text.empty() || (text.size() == 4 && BytesOfGroup(text) > 0);
-    const Decoded decoded = Decode(text);
+    const bool valid = text.empty() || (text.size() == 4 && bytesOfGroup(text) > 0);
+    const Decoded decoded = decode(text);
     ASSERT_EQ(decoded.ok, valid) << testing::PrintToString(text);
     if (text.size() == 4) {
-      ASSERT_EQ(decoded.bytes.size(), BytesOfGroup(text)) << text;
+      ASSERT_EQ(decoded.bytes.size(), bytesOfGroup(text)) << text;
     }
   }
 }
 
 TEST(PlatformBase64Decode, RefusesPaddingInTheMiddle) {
   for (const char* text : {"Zg==Zg==", "Zm8=Zm9v", "====", "A===", "=AAA"})
-    EXPECT_FALSE(Decode(text).ok) << text;
+    EXPECT_FALSE(decode(text).ok) << text;
 }
 
 struct URLEncoded {
@@ -219,7 +219,7 @@ struct URLEncoded {
 };
 
 // Encodes into a buffer that has room for `capacity` characters and a zero.
-URLEncoded URLEncode(const std::string& text, size_t capacity) {
+URLEncoded urlEncode(const std::string& text, size_t capacity) {
   std::vector<char> buffer(capacity + 1 + 8, kUntouched);
   const int result = QOVACGIURLEncode(text.c_str(), buffer.data(), capacity);
   for (size_t i = capacity + 1; i < buffer.size(); ++i) EXPECT_EQ(buffer[i], kUntouched) << text;
@@ -235,32 +235,32 @@ TEST(PlatformURLEncode, EscapesEveryByteOutsideTheUnreservedSet) {
     char escaped[8];
     std::snprintf(escaped, sizeof(escaped), "%%%02X", static_cast<unsigned>(value));
     const bool stays = unreserved.find(text) != std::string::npos;
-    const URLEncoded encoded = URLEncode(text, 3);
+    const URLEncoded encoded = urlEncode(text, 3);
     EXPECT_EQ(encoded.result, 0) << value;
     EXPECT_EQ(encoded.text, stays ? text : escaped);
   }
 }
 
 TEST(PlatformURLEncode, WritesASpaceAsItsEscapeAndNeverAsAPlus) {
-  EXPECT_EQ(URLEncode("a b+c", 15).text, "a%20b%2Bc");
+  EXPECT_EQ(urlEncode("a b+c", 15).text, "a%20b%2Bc");
 }
 
 TEST(PlatformURLEncode, FitsAllEscapesIntoThreeTimesTheLength) {
   for (size_t length = 1; length <= 20; ++length) {
     const std::string text(length, '\xff');
-    EXPECT_EQ(URLEncode(text, 3 * length).text.size(), 3 * length);
+    EXPECT_EQ(urlEncode(text, 3 * length).text.size(), 3 * length);
     for (size_t capacity = 0; capacity < 3 * length; ++capacity)
-      EXPECT_NE(URLEncode(text, capacity).result, 0) << length << " into " << capacity;
+      EXPECT_NE(urlEncode(text, capacity).result, 0) << length << " into " << capacity;
   }
 }
 
 TEST(PlatformURLEncode, CountsPlainCharactersOnce) {
-  EXPECT_EQ(URLEncode("abc", 3).text, "abc");
-  EXPECT_NE(URLEncode("abc", 2).result, 0);
+  EXPECT_EQ(urlEncode("abc", 3).text, "abc");
+  EXPECT_NE(urlEncode("abc", 2).result, 0);
 }
 
 TEST(PlatformURLEncode, EncodesNothingIntoNothing) {
-  const URLEncoded encoded = URLEncode("", 0);
+  const URLEncoded encoded = urlEncode("", 0);
   EXPECT_EQ(encoded.result, 0);
   EXPECT_EQ(encoded.text, "");
 }
@@ -270,7 +270,7 @@ struct Converted {
   std::string name;
 };
 
-Converted Convert(const std::string& name, size_t size) {
+Converted convert(const std::string& name, size_t size) {
   std::vector<char> buffer(size + 8, kUntouched);
   const int result = QOVAWinsUserNameFqdn2Netbios(name.c_str(), buffer.data(), size);
   for (size_t i = size; i < buffer.size(); ++i) EXPECT_EQ(buffer[i], kUntouched) << name;
@@ -279,21 +279,21 @@ Converted Convert(const std::string& name, size_t size) {
 
 TEST(PlatformUserName, IsPassedThroughAsItIs) {
   for (const char* name : {"", "\\", "CORP.EXAMPLE.COM\\alice", "\\bob", "M\xc3\x9cNCHEN.DE\\J"}) {
-    EXPECT_TRUE(Convert(name, 1023).ok) << name;
-    EXPECT_EQ(Convert(name, 1023).name, name);
+    EXPECT_TRUE(convert(name, 1023).ok) << name;
+    EXPECT_EQ(convert(name, 1023).name, name);
   }
 }
 
 TEST(PlatformUserName, NeedsRoomForTheNameAndItsZero) {
   for (size_t length = 0; length <= 8; ++length) {
     for (size_t size = 0; size <= length + 4; ++size)
-      EXPECT_EQ(Convert(std::string(length, 'n'), size).ok, size > length) << length << ' ' << size;
+      EXPECT_EQ(convert(std::string(length, 'n'), size).ok, size > length) << length << ' ' << size;
   }
 }
 
 TEST(PlatformUserName, OfUpTo1022BytesFitsInto1023) {
-  EXPECT_EQ(Convert(std::string(1022, 'n'), 1023).name, std::string(1022, 'n'));
-  EXPECT_FALSE(Convert(std::string(1023, 'n'), 1023).ok);
+  EXPECT_EQ(convert(std::string(1022, 'n'), 1023).name, std::string(1022, 'n'));
+  EXPECT_FALSE(convert(std::string(1023, 'n'), 1023).ok);
 }
 
 }  // namespace

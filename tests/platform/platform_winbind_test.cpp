@@ -22,12 +22,12 @@ constexpr char kUntouched = '\x5a';
 // reads them after they were given back.
 struct Domain {
   Domain(const char* dnsName, const char* netbiosName)
-      : dns(Copy(dnsName)), netbios(Copy(netbiosName)) {
+      : dns(copyOf(dnsName)), netbios(copyOf(netbiosName)) {
     info.dns_name = dns.get();
     info.short_name = netbios.get();
   }
 
-  static std::unique_ptr<char[]> Copy(const char* text) {
+  static std::unique_ptr<char[]> copyOf(const char* text) {
     if (text == nullptr) return nullptr;
     auto copy = std::make_unique<char[]>(strlen(text) + 1);
     strcpy(copy.get(), text);
@@ -80,7 +80,7 @@ class PlatformWinbind : public testing::Test {
 
   // The converted name, or "" for a negative result, which must leave the buffer alone. Writing
   // behind `size` fails the test.
-  std::string Convert(const std::string& name, size_t size = 1023) {
+  std::string convert(const std::string& name, size_t size = 1023) {
     std::vector<char> buffer(size + 8, kUntouched);
     const int rc = QOVAWinsUserNameFqdn2Netbios(name.c_str(), buffer.data(), size);
     const size_t used = rc < 0 ? 0 : strnlen(buffer.data(), buffer.size()) + 1;
@@ -93,13 +93,13 @@ class PlatformWinbind : public testing::Test {
 };
 
 TEST_F(PlatformWinbind, GivesTheNetbiosNameAndTheAccount) {
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice"), "PLANT7\\alice");
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice"), "PLANT7\\alice");
   EXPECT_EQ(winbind.asked, std::vector<std::string>{"AD.WERK.EXAMPLE.NET"});
 }
 
 TEST_F(PlatformWinbind, AsksForTheDomainOnce) {
-  Convert("AD.WERK.EXAMPLE.NET\\alice");
-  Convert("OTHER.EXAMPLE.NET\\alice");
+  convert("AD.WERK.EXAMPLE.NET\\alice");
+  convert("OTHER.EXAMPLE.NET\\alice");
   EXPECT_EQ(winbind.asked, (std::vector<std::string>{"AD.WERK.EXAMPLE.NET", "OTHER.EXAMPLE.NET"}));
 }
 
@@ -109,26 +109,26 @@ TEST_F(PlatformWinbind, TakesTheAccountAsItCame) {
         "al\xc3\xaf"
         "ce",
         ""}) {
-    EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\" + account), "PLANT7\\" + account);
+    EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\" + account), "PLANT7\\" + account);
   }
 }
 
 TEST_F(PlatformWinbind, TakesTheNetbiosNameAsWinbindHasIt) {
   winbind.netbios = "Plant 7";
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice"), "Plant 7\\alice");
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice"), "Plant 7\\alice");
 }
 
 TEST_F(PlatformWinbind, ComparesDnsNamesWithoutCase) {
   winbind.dns = "Ad-0.WERK.example.NET";
   for (const char* domain : {"AD-0.WERK.EXAMPLE.NET", "ad-0.werk.example.net",
                              "aD-0.werk.Example.net", "Ad-0.WERK.example.NET"}) {
-    EXPECT_EQ(Convert(std::string(domain) + "\\alice"), "PLANT7\\alice") << domain;
+    EXPECT_EQ(convert(std::string(domain) + "\\alice"), "PLANT7\\alice") << domain;
   }
 }
 
 TEST_F(PlatformWinbind, ComparesTheWholeAlphabetWithoutCase) {
   winbind.dns = "abcdefghijklmnopqrstuvwxyz.0123456789-";
-  EXPECT_EQ(Convert("ABCDEFGHIJKLMNOPQRSTUVWXYZ.0123456789-\\alice"), "PLANT7\\alice");
+  EXPECT_EQ(convert("ABCDEFGHIJKLMNOPQRSTUVWXYZ.0123456789-\\alice"), "PLANT7\\alice");
 }
 
 // Bit 0x20 makes the difference between the cases of letters, and nothing but a difference
@@ -137,8 +137,8 @@ TEST_F(PlatformWinbind, KnowsTheCaseOfLettersAlone) {
   const char* pairs[][2] = {{"a`z", "a@z"}, {"a{z", "a[z"}, {"a\xe4z", "a\xc4z"}, {"a\rz", "a-z"}};
   for (const auto& pair : pairs) {
     winbind.dns = pair[0];
-    EXPECT_EQ(Convert(std::string(pair[1]) + "\\alice"), "") << pair[1];
-    EXPECT_EQ(Convert(std::string(pair[0]) + "\\alice"), "PLANT7\\alice");
+    EXPECT_EQ(convert(std::string(pair[1]) + "\\alice"), "") << pair[1];
+    EXPECT_EQ(convert(std::string(pair[0]) + "\\alice"), "PLANT7\\alice");
   }
 }
 
@@ -147,34 +147,34 @@ TEST_F(PlatformWinbind, RefusesADomainOfAnotherDnsName) {
   for (const char* domain :
        {"PLANT7", "WERK.EXAMPLE.NET", "AD.WERK.EXAMPLE.NE", "AD.WERK.EXAMPLE.NET.",
         "AD.WERK.EXAMPLE.NETT", "XD.WERK.EXAMPLE.NET", "AD.WERK.EXAMPLE", "A"}) {
-    EXPECT_EQ(Convert(std::string(domain) + "\\alice"), "") << domain;
+    EXPECT_EQ(convert(std::string(domain) + "\\alice"), "") << domain;
     EXPECT_EQ(winbind.asked.back(), domain);
   }
 }
 
 TEST_F(PlatformWinbind, RefusesAnAnswerThatLacksAName) {
   winbind.dns = nullptr;
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice"), "");
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice"), "");
   winbind.dns = "";
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice"), "");
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice"), "");
   winbind.dns = "ad.werk.example.net";
   winbind.netbios = nullptr;
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice"), "");
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice"), "");
   winbind.netbios = "";
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice"), "");
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice"), "");
   EXPECT_EQ(winbind.asked.size(), 4u);
 }
 
 TEST_F(PlatformWinbind, RefusesAnAnswerWithoutADomain) {
   winbind.knows = false;
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice"), "");
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice"), "");
 }
 
 TEST_F(PlatformWinbind, FailsWhereWinbindFails) {
   winbind.knows = false;
   for (int status = WBC_ERR_NOT_IMPLEMENTED; status <= WBC_ERR_PWD_CHANGE_FAILED; ++status) {
     winbind.status = static_cast<wbcErr>(status);
-    EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice"), "") << status;
+    EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice"), "") << status;
   }
   EXPECT_EQ(winbind.asked.size(), 13u);
 }
@@ -183,7 +183,7 @@ TEST_F(PlatformWinbind, RefusesWhatIsNotADomainAndAnAccount) {
   for (const char* name :
        {"", "alice", "\\", "\\alice", "ad.werk.example.net", "AD.WERK.EXAMPLE.NET\\eve\\alice",
         "AD.WERK.EXAMPLE.NET\\\\alice", "AD.WERK.EXAMPLE.NET\\alice\\"}) {
-    EXPECT_EQ(Convert(name), "") << name;
+    EXPECT_EQ(convert(name), "") << name;
   }
   EXPECT_TRUE(winbind.asked.empty());
 }
@@ -191,26 +191,26 @@ TEST_F(PlatformWinbind, RefusesWhatIsNotADomainAndAnAccount) {
 TEST_F(PlatformWinbind, AsksForNoDomainThatWouldBeCut) {
   const std::string longest(255, 'a');
   winbind.dns = longest.c_str();
-  EXPECT_EQ(Convert(longest + "\\alice"), "PLANT7\\alice");
+  EXPECT_EQ(convert(longest + "\\alice"), "PLANT7\\alice");
   EXPECT_EQ(winbind.asked.back(), longest);
-  EXPECT_EQ(Convert(longest + "a\\alice"), "");
-  EXPECT_EQ(Convert(std::string(100000, 'a') + "\\alice"), "");
+  EXPECT_EQ(convert(longest + "a\\alice"), "");
+  EXPECT_EQ(convert(std::string(100000, 'a') + "\\alice"), "");
   EXPECT_EQ(winbind.asked.size(), 1u);
 }
 
 TEST_F(PlatformWinbind, NeverCutsTheResult) {
   const std::string whole = "PLANT7\\alice";
   for (size_t size = 0; size <= whole.size(); ++size) {
-    EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice", size), "") << size;
+    EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice", size), "") << size;
   }
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice", whole.size() + 1), whole);
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\alice", whole.size() + 2), whole);
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice", whole.size() + 1), whole);
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\alice", whole.size() + 2), whole);
 }
 
 TEST_F(PlatformWinbind, FillsTheLibrarysBufferToItsLastByte) {
   const std::string account(1023 - 1 - strlen("PLANT7\\"), 'x');
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\" + account), "PLANT7\\" + account);
-  EXPECT_EQ(Convert("AD.WERK.EXAMPLE.NET\\x" + account), "");
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\" + account), "PLANT7\\" + account);
+  EXPECT_EQ(convert("AD.WERK.EXAMPLE.NET\\x" + account), "");
 }
 
 }  // namespace

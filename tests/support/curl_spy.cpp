@@ -5,7 +5,7 @@
 #include <cerrno>
 #include <cstdarg>
 
-#include "support/busy.h"
+#include "support/support_call.h"
 
 #undef curl_easy_setopt
 
@@ -39,7 +39,7 @@ void note(const std::string& call) {
 #define SPY extern "C" __attribute__((visibility("default")))
 
 SPY CURLcode curl_global_init(long flags) {
-  const test::Busy busy;
+  const test::SupportCall call;
   note("global_init " + std::to_string(flags));
   test::CurlSpy* const told = spy;
   const Inside inside;
@@ -48,14 +48,14 @@ SPY CURLcode curl_global_init(long flags) {
 }
 
 SPY void curl_global_cleanup() {
-  const test::Busy busy;
+  const test::SupportCall call;
   note("global_cleanup");
   const Inside inside;
   next<void (*)()>("curl_global_cleanup")();
 }
 
 SPY CURL* curl_easy_init() {
-  const test::Busy busy;
+  const test::SupportCall call;
   note("easy_init");
   if (spy != nullptr && spy->noHandle) {
     errno = ENOMEM;
@@ -66,14 +66,14 @@ SPY CURL* curl_easy_init() {
 }
 
 SPY void curl_easy_cleanup(CURL* handle) {
-  const test::Busy busy;
+  const test::SupportCall call;
   if (handle != nullptr) note("easy_cleanup");
   const Inside inside;
   next<void (*)(CURL*)>("curl_easy_cleanup")(handle);
 }
 
 SPY CURLcode curl_easy_perform(CURL* handle) {
-  const test::Busy busy;
+  const test::SupportCall call;
   note("perform");
   if (spy != nullptr && spy->onPerform) return spy->onPerform(handle);
   const Inside inside;
@@ -81,8 +81,8 @@ SPY CURLcode curl_easy_perform(CURL* handle) {
 }
 
 SPY CURLcode curl_easy_setopt(CURL* handle, CURLoption option, ...) {
-  const test::Busy busy;
-  note("setopt " + std::to_string(option));
+  const test::SupportCall call;
+  note(std::string("setopt ") + curl_easy_option_by_id(option)->name);
   const auto real = next<CURLcode (*)(CURL*, CURLoption, ...)>("curl_easy_setopt");
   va_list arguments;
 #pragma GCC diagnostic push

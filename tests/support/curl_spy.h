@@ -18,7 +18,7 @@ class CurlSpy {
   CurlSpy(const CurlSpy&) = delete;
   CurlSpy& operator=(const CurlSpy&) = delete;
 
-  // "global_init 3", "easy_init", "setopt 10002", "perform", "easy_cleanup", "global_cleanup".
+  // "global_init 3", "easy_init", "setopt URL", "perform", "easy_cleanup", "global_cleanup".
   // A cleanup of a null handle is not recorded: it does nothing.
   std::vector<std::string> calls;
 

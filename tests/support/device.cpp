@@ -14,7 +14,7 @@
 #include <sstream>
 #include <stdexcept>
 
-#include "support/unnamed_file.h"
+#include "support/memory_file.h"
 
 namespace test {
 namespace {
@@ -57,7 +57,7 @@ std::string guarded(Ids user, Ids group, const std::function<std::string()>& bod
 }
 
 // Hands back file, line and text of each failure, and then the answer.
-[[noreturn]] void runChild(const UnnamedFile& report, Ids user, Ids group,
+[[noreturn]] void runChild(const MemoryFile& report, Ids user, Ids group,
                            const std::function<std::string()>& body) {
   const testing::TestResult& result =
       *testing::UnitTest::GetInstance()->current_test_info()->result();
@@ -123,7 +123,7 @@ void resolveToLoopback(const std::string& host) {
 std::string stdoutOf(const std::function<void()>& call) {
   flushAll();
   const int before = dup(1);
-  const UnnamedFile file;
+  const MemoryFile file;
   dup2(file.descriptor(), 1);
   const auto restore = [&] {
     flushAll();
@@ -163,7 +163,7 @@ int CoutRecorder::sync() {
 std::string asProcess(Ids user, Ids group, const std::function<std::string()>& body) {
   requireSandbox();
   flushAll();
-  const UnnamedFile report;
+  const MemoryFile report;
   const pid_t child = fork();
   if (child < 0) fail("fork");
   if (child == 0) runChild(report, user, group, body);

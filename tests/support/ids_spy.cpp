@@ -7,7 +7,7 @@
 #include <cerrno>
 #include <cstring>
 
-#include "support/busy.h"
+#include "support/support_call.h"
 
 namespace {
 
@@ -23,7 +23,7 @@ std::string number(unsigned id) {
 }
 
 int change(const char* name, unsigned real, unsigned effective, unsigned saved) {
-  const test::Busy busy;
+  const test::SupportCall call;
   if (spy != nullptr) {
     spy->all.push_back(std::string(name) + "(" + number(real) + ", " + number(effective) + ", " +
                        number(saved) + ")");
@@ -42,7 +42,7 @@ int change(const char* name, unsigned real, unsigned effective, unsigned saved) 
 }
 
 unsigned answer(const char* name, std::vector<unsigned>* scripted) {
-  const test::Busy busy;
+  const test::SupportCall call;
   if (spy != nullptr) {
     spy->all.push_back(name);
     if (!scripted->empty()) {
@@ -55,7 +55,7 @@ unsigned answer(const char* name, std::vector<unsigned>* scripted) {
 }
 
 void noteBuffer(int error, const char* buffer, std::size_t size) {
-  const test::Busy busy;
+  const test::SupportCall call;
   if (spy == nullptr) return;
   const bool zero = std::all_of(buffer, buffer + size, [](char c) { return c == 0; });
   spy->buffers.push_back({size, zero, error});

@@ -5,7 +5,7 @@
 #include <cstdio>
 #include <regex>
 
-#include "support/busy.h"
+#include "support/support_call.h"
 
 namespace {
 
@@ -18,7 +18,7 @@ std::vector<test::LogLine>& recorded() {
 
 void record(int priority, const char* format, va_list arguments) {
   const int error = errno;
-  const test::Busy busy;
+  const test::SupportCall call;
   va_list again;
   va_copy(again, arguments);
 #pragma GCC diagnostic push

@@ -7,7 +7,7 @@
 #include <cstring>
 #include <new>
 
-#include "support/busy.h"
+#include "support/support_call.h"
 
 namespace {
 
@@ -31,7 +31,7 @@ std::size_t failingBytes = 0;
 std::size_t failures = 0;
 
 void* allocate(std::size_t size) {
-  if (test::busy == 0 && untilNew > 0 && --untilNew == 0) {
+  if (test::support_calls == 0 && untilNew > 0 && --untilNew == 0) {
     failed = true;
     return nullptr;
   }

@@ -17,8 +17,8 @@
 #include <vector>
 
 #include "support/ca.h"
+#include "support/memory_file.h"
 #include "support/server.h"
-#include "support/unnamed_file.h"
 
 namespace test {
 
@@ -62,7 +62,7 @@ class Provider {
   Server server;
   Identity identity;
   bool tls = false;
-  UnnamedFile received;
+  MemoryFile received;
   std::map<std::string, std::vector<Answer>> script;
 };
 

@@ -9,7 +9,8 @@ SSOCLIENT_SOURCE = ssoclient-$(SSOCLIENT_VERSION).tar.gz
 # Made by scripts/release; put it into the download folder.
 SSOCLIENT_SITE = $(BR2_EXTERNAL_SSOCLIENT_PATH)/ssoclient/dl
 SSOCLIENT_SITE_METHOD = file
-# The owner has not chosen a licence yet.
+# The owner has not chosen a licence yet, so there is no licence file either.
+SSOCLIENT_LICENSE = unknown
 SSOCLIENT_REDISTRIBUTE = NO
 SSOCLIENT_INSTALL_STAGING = YES
 SSOCLIENT_DEPENDENCIES = boost host-pkgconf jsoncpp libcurl openssl

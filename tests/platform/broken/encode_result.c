@@ -1,0 +1,10 @@
+/* Found by: encode-bytes
+ * Returns 0 for success, as most functions do. */
+#define QOVABase64Encode GoodBase64Encode
+#include "platform/encoding.c"
+#include "platform/passthrough.c"
+#undef QOVABase64Encode
+
+int QOVABase64Encode(const char* source, size_t length, char* text, size_t capacity, int option) {
+  return !GoodBase64Encode(source, length, text, capacity, option);
+}

@@ -1,0 +1,11 @@
+/* Found by: name-data
+ * The name is used as a format. */
+#include <stdio.h>
+#define QOVAWinsUserNameFqdn2Netbios GoodWinsUserNameFqdn2Netbios
+#include "platform/encoding.c"
+#include "platform/passthrough.c"
+#undef QOVAWinsUserNameFqdn2Netbios
+
+int QOVAWinsUserNameFqdn2Netbios(const char* name, char* result, size_t size) {
+  return snprintf(result, size, name) < (int)size ? 0 : -1;
+}
