@@ -35,26 +35,6 @@ std::vector<Said> WithoutFile(const Checkup& checkup, const File& file) {
   return said;
 }
 
-// A file that is probably meant to be this one: in other letters, with one more ending, misspelt,
-// or in another folder.
-std::string NearMiss(const std::string& name) {
-  const std::string stem = name.substr(0, name.find('.'));
-  for (const char* folder : {kFolder, "/usr/qova/etc/", "/etc/ssoclient/"}) {
-    std::error_code error;
-    for (const auto& entry : std::filesystem::directory_iterator(folder, error)) {
-      const std::string file = entry.path().filename();
-      const std::string plain = Skeleton(file);
-      if (file[0] == '.' || !entry.is_regular_file(error)) continue;
-      if (folder == std::string(kFolder) && FindKind(file) != nullptr) continue;
-      if (Nearest(plain, {name}) == name || Nearest(plain.substr(0, name.size()), {name}) == name ||
-          Nearest(plain.substr(0, plain.find('.')), {stem}) == stem) {
-        return entry.path();
-      }
-    }
-  }
-  return "";
-}
-
 class FileCheck {
  public:
   FileCheck(Checkup& checked, const File& found, bool needed)
@@ -101,8 +81,8 @@ class FileCheck {
       return missing(name + " does not exist",
                      "Create it: a JSON object, owner root, mode " + good_mode + ".");
     }
-    return missing(name + " does not exist, but " + Quote(Shown(near, 200)) + " does",
-                   "mv '" + Shown(near, 200) + "' " + file.path);
+    return missing(name + " does not exist, but " + Quote(near) + " does",
+                   "mv '" + near + "' " + file.path);
   }
 
   // The file of the other provider keeps no user from signing in.
@@ -188,7 +168,7 @@ class FileCheck {
     }
     return Unusable("file-syntax", name + " is not JSON: " + problem,
                     "Fix the text there: names and strings in double quotes, a comma between "
-                    "members, none after the last.");
+                    "members, none after the last, true and false in lower case.");
   }
 
   Checkup& checkup;
@@ -221,6 +201,24 @@ File Load(const FileKind& kind) {
   if (file.text.size() >= kLongestFile) file.error = EFBIG;
   close(descriptor);
   return file;
+}
+
+std::string NearMiss(const std::string& name) {
+  const std::string stem = name.substr(0, name.find('.'));
+  for (const char* folder : {kFolder, "/usr/qova/etc/", "/etc/ssoclient/"}) {
+    std::error_code error;
+    for (const auto& entry : std::filesystem::directory_iterator(folder, error)) {
+      const std::string file = entry.path().filename();
+      const std::string plain = Skeleton(file);
+      if (file[0] == '.' || !entry.is_regular_file(error)) continue;
+      if (folder == std::string(kFolder) && FindKind(file) != nullptr) continue;
+      if (Nearest(plain, {name}) == name || Nearest(plain.substr(0, name.size()), {name}) == name ||
+          Nearest(plain.substr(0, plain.find('.')), {stem}) == stem) {
+        return Shown(entry.path(), 200);
+      }
+    }
+  }
+  return "";
 }
 
 bool CheckFile(Checkup& checkup, const File& file, bool in_use, Json::Value& document) {

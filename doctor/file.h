@@ -25,6 +25,10 @@ extern const char kFolder[];
 // Reads the file without waiting for whatever it may be.
 File Load(const FileKind& kind);
 
+// A file that is probably meant to be this one: in other letters, with one more ending, misspelt,
+// or in another folder; empty: none. As it may be shown.
+std::string NearMiss(const std::string& name);
+
 // Adds what is wrong with the file, its mode and its JSON. True if it holds a JSON object, which
 // is then in `document`. `in_use`: a sign-in needs the file.
 bool CheckFile(Checkup& checkup, const File& file, bool in_use, Json::Value& document);

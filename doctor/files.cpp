@@ -1,6 +1,9 @@
 // The three configuration files: who can read them, and what their keys hold.
 #include <unistd.h>
 
+#include <algorithm>
+#include <filesystem>
+
 #include "doctor/characters.h"
 #include "doctor/checkup.h"
 #include "doctor/file.h"
@@ -51,6 +54,16 @@ void CheckProfile(Checkup& checkup, const File& file, const Json::Value& documen
   }
 }
 
+// The command that lets users read the file.
+std::string Opening(const File& file, const Spot& closed) {
+  if (closed.path == file.path) return "chmod 0644 " + file.path;
+  if (file.path.compare(0, closed.path.size(), closed.path) == 0) {
+    return "chmod a+rx " + closed.path;
+  }
+  return "Put the file itself in place of the link: cp --remove-destination $(readlink -f " +
+         file.path + ") " + file.path;
+}
+
 // OIDCLogin reads the profile file without the guard, with the caller's own permissions.
 void CheckProfileReader(Checkup& checkup, const File& file) {
   if (geteuid() != 0) return;
@@ -67,7 +80,7 @@ void CheckProfileReader(Checkup& checkup, const File& file) {
        (checkup.caller ? "The user " + caller.name + " cannot read " : "Not every user can read ") +
            std::string(file.kind.name) + ": " + spot.path + " is closed (" + spot.Owner() + ")",
        file.At(),
-       (spot.path == file.path ? "chmod 0644 " : "chmod a+rx ") + spot.path +
+       Opening(file, spot) +
            (group ? ", or name the login program's user with --user to know." : ""),
        reply.said});
 }
@@ -83,6 +96,27 @@ void CheckFolder(Checkup& checkup) {
                           std::to_string(status.st_uid) + ", mode " + Mode(status) + ")",
                       {folder}, "chown root:root " + folder + "; chmod 0755 " + folder,
                       {Said::Does("does not check owner and mode")});
+}
+
+// Copies that editors and people leave behind.
+void CheckCopies(Checkup& checkup) {
+  std::error_code error;
+  for (const auto& entry : std::filesystem::directory_iterator(kFolder, error)) {
+    const std::string name = entry.path().filename();
+    Spot spot{entry.path()};
+    if (FindKind(name) != nullptr || lstat(spot.path.c_str(), &spot.status) != 0) continue;
+    const bool copy =
+        std::any_of(std::begin(kFileKinds), std::end(kFileKinds), [&name](const FileKind& kind) {
+          return kind.secret && name.find(kind.name) < 2 &&
+                 access((kFolder + std::string(kind.name)).c_str(), F_OK) == 0;
+        });
+    if (!copy || !S_ISREG(spot.status.st_mode) || (spot.status.st_mode & 044) == 0) continue;
+    const std::string shown = Shown(spot.path, 200);
+    checkup.report.Warn(
+        "secret-readable",
+        "Users other than root can read a copy of the settings (" + spot.Owner() + ")", {shown},
+        "rm '" + shown + "', and set a new client secret.");
+  }
 }
 
 // --- secrets
@@ -115,6 +149,7 @@ void HideSecrets(const FileKind& kind, const Json::Value& document) {
 
 void CheckFiles(Checkup& checkup) {
   CheckFolder(checkup);
+  CheckCopies(checkup);
   const File profile = Load(kFileKinds[0]);
   Json::Value document;
   if (CheckFile(checkup, profile, true, document)) {

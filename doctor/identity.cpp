@@ -26,11 +26,23 @@ Caller UserByName(const std::string& name) {
   return caller;
 }
 
+// The guard's own error lines.
+std::vector<Said> GuardErrors(const Reply& reply) {
+  std::vector<Said> lines;
+  for (const Said& line : reply.ErrorLines()) {
+    if (line.text.compare(0, 7, "ERROR: ") == 0) lines.push_back(line);
+  }
+  return lines;
+}
+
 // Asks the library as the login program would. With root as saved identity it can only fail if
 // this command itself lacks a permission.
 void CheckGuard(Checkup& checkup, const Caller* caller, const std::string& who) {
   const Reply reply = checkup.library.Profile(caller);
-  if (reply.ended && reply.Thrown().empty() && reply.ErrorLines().empty()) {
+  if (!reply.ended && checkup.report.Has("file-unreadable")) {
+    return checkup.report.Skip("The identity of the login program", "file-unreadable");
+  }
+  if (reply.ended && reply.Thrown().empty() && GuardErrors(reply).empty()) {
     checkup.report.Good("identity", "The library can become root and back as " + who);
     return;
   }
@@ -49,7 +61,7 @@ void CheckAsOther(Checkup& checkup) {
 
 // Without root the doctor is one more caller, and not the login program.
 void CheckAsOurselves(Checkup& checkup) {
-  const std::vector<Said> errors = checkup.library.Profile().ErrorLines();
+  const std::vector<Said> errors = GuardErrors(checkup.library.Profile());
   if (errors.empty()) {
     checkup.report.Good("identity", "The library can become root in this command");
     return;

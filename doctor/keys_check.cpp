@@ -38,6 +38,7 @@ class KeysCheck {
       : checkup(checked), file(found), in_use(needed), document(settings) {}
 
   void Run() {
+    CheckProvider();
     CheckNested();
     CheckOdd();
     for (const std::string& key : document.getMemberNames()) {
@@ -52,6 +53,27 @@ class KeysCheck {
   // True if the file has the key, in a place where the library does not see it.
   bool IsHidden(const Key& key) const {
     return !document.isMember(key.name) && file.text.find(Quote(key.name)) != std::string::npos;
+  }
+
+  // The keys of another file alone.
+  void CheckProvider() {
+    for (const FileKind& other : kFileKinds) {
+      size_t found = 0;
+      for (const std::string& key : document.getMemberNames()) {
+        if (FindKey(file.kind, key) != nullptr) return;
+        if (FindKey(other, key) != nullptr) ++found;
+      }
+      if (found < 2) continue;
+      of_another = "file-of-another";
+      for (const Key& key : file.kind.keys) explained.insert({&key, of_another});
+      checkup.report.Add({of_another,
+                          Grave(true),
+                          std::string(file.kind.name) + " holds the settings of " + other.name,
+                          file.At(),
+                          "Write the keys of " + std::string(file.kind.name) +
+                              " into it, or set \"sso_profile\" to the other provider.",
+                          {Said::Does("ignores them without a message")}});
+    }
   }
 
   void CheckNested() {
@@ -125,7 +147,8 @@ class KeysCheck {
                             (odd.empty() ? "" : ": it holds " + odd),
                         file.At(Shown(key, 60)),
                         action,
-                        {Said::Does("ignores it without a message")}});
+                        {Said::Does("ignores it without a message")},
+                        of_another});
   }
 
   // What keeps a key from having an effect; empty if nothing does.
@@ -202,6 +225,7 @@ class KeysCheck {
   const File& file;
   const bool in_use;
   const Json::Value& document;
+  std::string of_another;                       // the finding that the file is another's
   std::map<const Key*, std::string> explained;  // missing keys, and the finding that says why
 };
 

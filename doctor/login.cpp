@@ -10,7 +10,9 @@
 #include <fstream>
 #include <map>
 
+#include "doctor/characters.h"
 #include "doctor/checkup.h"
+#include "doctor/file.h"
 #include "doctor/paths.h"
 #include "doctor/redact.h"
 #include "doctor/text.h"
@@ -57,7 +59,12 @@ class ConfCheck {
 
   void Run() {
     struct stat status = {};
-    if (lstat(kConf, &status) != 0) return;
+    if (lstat(kConf, &status) != 0) {
+      const std::string near = NearMiss("login.conf");
+      if (near.empty()) return;
+      return checkup.report.Warn("login-conf-ignored", "The login program does not read " + near,
+                                 {near}, "mv '" + near + "' " + kConf);
+    }
     checkup.reference_program = true;
     if (IsUsable()) ReadLines();
   }
@@ -130,8 +137,10 @@ class ConfCheck {
       names.push_back(known.name);
       if (key == known.name) return CheckValue(known, value, number);
     }
-    const std::string near = Nearest(key, names);
-    Ignored(number, key, "there is no key " + Quote(Shown(key, 60)),
+    const std::string near = Nearest(Skeleton(key), names);
+    const std::string odd = OddCharacter(key);
+    Ignored(number, key,
+            "there is no key " + Quote(Shown(key, 60)) + (odd.empty() ? "" : ": it holds " + odd),
             near.empty() ? "Remove it." : "Rename it to " + Quote(near) + ".");
   }
 

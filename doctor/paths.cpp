@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <filesystem>
 #include <vector>
 
 #include "doctor/json.h"
@@ -66,10 +67,16 @@ std::optional<Spot> WritableByOthers(const std::string& path) {
 }
 
 std::optional<Spot> ClosedTo(const Caller& caller, const std::string& path, int mode) {
+  // Behind links first: what is closed there keeps the link itself from being passed.
+  std::error_code error;
+  const std::string real = std::filesystem::canonical(path, error);
+  std::vector<std::string> steps = Steps(real);
+  for (const std::string& step : Steps(path)) steps.push_back(step);
   const Reply reply = Ask(
       [&] {
-        for (const std::string& step : Steps(path)) {
-          if (faccessat(AT_FDCWD, step.c_str(), step == path ? mode : X_OK, AT_EACCESS) != 0) {
+        for (const std::string& step : steps) {
+          const bool last = step == path || step == real;
+          if (faccessat(AT_FDCWD, step.c_str(), last ? mode : X_OK, AT_EACCESS) != 0) {
             return Json::Value(step);
           }
         }

@@ -117,7 +117,7 @@ class ProgramCheck {
     if (!run.output.ended) {
       return Add("program-silent", Grade::kFailure,
                  "did not end within " + std::to_string(checkup.options.timeout) + " s",
-                 "See the system log for what it waits for.", root_fault);
+                 "See the system log for what it waits for.", Explanation());
     }
     if (WIFSIGNALED(run.output.status)) {
       return Add("program-crashed", Grade::kFailure,
@@ -163,7 +163,7 @@ class ProgramCheck {
       return Add(
           "program-no-answer", Grade::kFailure,
           "ended without an answer (" + status_text + ")" + (error.empty() ? "" : ": " + error),
-          error.empty() ? "See the system log." : "Fix what it reports.", root_fault);
+          error.empty() ? "See the system log." : "Fix what it reports.", Explanation());
     }
     Add("program-bad-answer", Grade::kFailure,
         "does not answer as a CGI program (" + status_text + "); its output begins with " +
@@ -189,6 +189,10 @@ class ProgramCheck {
     const bool settled =
         std::string(" bad-request disabled not-set-up ").find(" " + reason + " ") !=
         std::string::npos;
+    if (failed && !settled && caller.uid == 0) {
+      return Add("program-error", Grade::kFailure, "does not serve a web server that runs as root",
+                 "Let the web server run as a user of its own, and name it with --user.");
+    }
     if (checkup.reference_program ? failed && !settled : code >= "500") {
       return Add(
           "program-error", Grade::kFailure,
@@ -196,11 +200,19 @@ class ProgramCheck {
           failed
               ? "See the system log: journalctl | grep -F 'sign-in failed [" + found[2].str() + "]'"
               : "See the web server's error log and the system log.",
-          !root_fault.empty() ? root_fault : "login-conf-unusable");
+          Explanation());
     }
     if (!checkup.reference_program && program.IsScript()) return CheckScript();
     checkup.report.Good("program", "The login program starts as " + caller.name + " and answers",
                         {path});
+  }
+
+  // The earlier finding that explains an error of the program.
+  std::string Explanation() const {
+    for (const char* id : {"login-conf-unusable", "profile-private", "file-unreadable"}) {
+      if (checkup.report.Has(id)) return id;
+    }
+    return root_fault;
   }
 
   void CheckScript() {

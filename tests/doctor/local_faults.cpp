@@ -6,6 +6,7 @@
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <csignal>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
@@ -17,6 +18,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
+constexpr uid_t kWebUser = 33;
 constexpr gid_t kWebGroup = 33;
 constexpr char kWeb[] = "/usr/qova/web/";
 
@@ -154,6 +156,13 @@ std::vector<SeededFault> answerFaults() {
     return [name](Site& site) { installProgram(site, name); };
   };
   return {
+      local(
+          "RunForRoot",
+          [](Site& s) {
+            installProgram(s, "internal.cgi");
+            s.arguments.insert(s.arguments.end(), {"--user", "root"});
+          },
+          "program-error", "failure", "runs as root", "a user of its own"),
       local("RunHangs", program("hang.cgi"), "program-silent", "failure", "within 2 s",
             "system log"),
       local("RunCrashes", program("crash.cgi"), "program-crashed", "failure", "Segmentation fault",
@@ -230,6 +239,17 @@ std::vector<SeededFault> keptFaults() {
             "larger than 64 KB", "Remove"),
       local("ConfKeyMisspelt", conf("dead_line = 30\n"), "login-conf-ignored", "warning", "line 1",
             "Rename it to \"deadline\""),
+      local("ConfByteOrderMark",
+            conf("\xEF\xBB\xBF"
+                 "deadline = 30\n"),
+            "login-conf-ignored", "warning", "a byte-order mark", "Rename it to \"deadline\""),
+      local(
+          "ConfNearMiss",
+          [](Site& s) {
+            s.arguments = {"--offline"};
+            writeConfig("Login.conf", "deadline = 30\n", 0644);
+          },
+          "login-conf-ignored", "warning", "does not read", "mv '"),
       local("ConfKeyUnknown", conf("# x\n\nflavour = 3\n"), "login-conf-ignored", "warning",
             "line 3", "Remove it"),
       local("ConfNumberTooLarge", conf("deadline = 9999\n"), "login-conf-ignored", "warning",
@@ -407,6 +427,14 @@ std::vector<SeededFault> textFaults() {
       local("TextNested",
             change([](const std::string& text) { return "{\"azure\":" + text + "}"; }),
             "file-nested", "failure", "under \"azure\"", "directly between"),
+      local("TextOfTheOtherProvider", change([](const std::string& text) {
+              std::string other = text;
+              for (size_t at; (at = other.find("\"azure_")) != std::string::npos;) {
+                other.replace(at, 7, "\"websphere_");
+              }
+              return other;
+            }),
+            "file-of-another", "failure", "holds the settings of websphere.conf", "sso_profile"),
       local("TextZerosBehind",
             change([](const std::string& text) { return text + std::string(100, '\0'); }),
             "file-odd", "warning", "behind the closing brace", "Remove"),
