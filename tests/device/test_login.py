@@ -1,4 +1,4 @@
-"""What the login program does for an honest user, and against anyone else."""
+"""What the login program does for an honest user, and against everyone else."""
 
 import base64
 import concurrent.futures
@@ -146,7 +146,7 @@ class Callback(DeviceTest):
                                     "nonce does not belong to this login", browser=attacker)
 
     def test_stolen_code_and_a_state_made_to_fit(self):
-        """The attacker writes the victim's nonce into the state of a login of his own."""
+        """The attacker writes the victim's nonce into the state of his own login."""
         victims = self.callback_url()
         attacker = self.new_browser()
         own = self.callback_url(attacker)

@@ -326,7 +326,7 @@ class Interference(DeviceTest):
 
     def test_ids_that_stay_raised(self):
         """Each time that the library or the program gives root back, it fails: the program ends
-        at once. The provider is not asked, and no user is signed in."""
+        at once. Nothing is asked, no user is signed in, and nothing more is logged."""
         for query, cookie in (("action=start", ""), self._callback()):
             number = 0
             while True:
