@@ -11,29 +11,39 @@ import sys
 
 import forward
 from browser import BrowserError
+from narrate import Narrator
 from providers.entra import Entra
 from providers.glewlwyd import Glewlwyd
 from providers.lemonldap import LemonLDAP
 from providers.liberty import Liberty
 from scene import DEVICE, PROVIDER, Scene, StepError, say, show_logs
-from stage import Stage, StageError
+from stage import WWW, Stage, StageError
+
+NEXT = """
+  scripts/demo --serve                  the same in your own browser, with every step explained
+  scripts/demo --serve --login PROGRAM  with your own login program
+  docs/integrating.md                   what a login program must do; device/ is one to copy from
+  ssoclient-doctor                      on a device: finds out why a sign-in fails"""
 
 PROVIDERS = {"glewlwyd": Glewlwyd, "lemonldap": LemonLDAP, "entra": Entra, "liberty": Liberty}
 
 
-def serve(scene, profile, sockets):
+def serve(scene, narrator, profile, login, sockets):
     titles = [title for title, setup in scene.provider.setups.items() if setup[0] == profile]
     if not titles:
         raise StageError(f"{scene.provider.title} has no sign-in for the profile {profile}")
     scene.choose(titles[-1])
     forward.start(sockets)
     person = scene.person
+    own = """Your login program is /webman/login.cgi there. The device's front page knows the sessions of the
+reference login program alone: with yours it goes on saying that you are not signed in.
+""" if login else ""
     print(f"""
 The demo is running; sign-in "{titles[-1]}".
   Open        {scene.stage.device}/
   Name        {scene.provider.login_name}
   Password    {person.password}
-Both servers' certificates come from an authority made for this run: your browser will warn,
+{own}Both servers' certificates come from an authority made for this run: your browser will warn,
 once for the device and once for the provider ({scene.provider.url}/).
 Browsers find names below ".localhost" by themselves. If yours does not, add to the hosts file
 of the machine where it runs:
@@ -41,8 +51,9 @@ of the machine where it runs:
 Only this machine is listened to. From another one, let ssh carry both ports:
   ssh -L {scene.stage.device_port}:127.0.0.1:{scene.stage.device_port} \
 -L {scene.stage.provider_port}:127.0.0.1:{scene.stage.provider_port} USER@THIS-MACHINE
-Ctrl-C ends it.
+Ctrl-C ends it. What happens from now on:
 """, flush=True)
+    narrator.begin(scene.settings[titles[-1]])
     while True:
         signal.pause()
 
@@ -61,8 +72,10 @@ def visits(scene, pictures):
             done.append(visit.outcome())
         if pictures:
             Pictures(scene, chromium, pictures).take()
-    say("all sign-ins succeeded:")
-    print("\n".join("  " + line for line in done), flush=True)
+    print(f"""
+What happened, in Chromium, on a device and at a provider that exist in this run alone:
+{chr(10).join("  " + line for line in done)}
+Next:{NEXT}""", flush=True)
 
 
 def read_options():
@@ -74,6 +87,7 @@ def read_options():
     parser.add_argument("--provider", choices=PROVIDERS, default="glewlwyd")
     parser.add_argument("--screenshots")
     parser.add_argument("--serve", choices=("azure", "websphere"))
+    parser.add_argument("--login")
     parser.add_argument("--sockets", type=int, nargs=2)
     return parser.parse_args()
 
@@ -86,10 +100,13 @@ def main():
 
     stage = Stage(DEVICE, PROVIDER, options.port, options.port + 1)
     scene = Scene(stage, PROVIDERS[options.provider])
+    narrator = Narrator(stage) if options.serve else None
     try:
-        scene.set_up(options.prefix, options.programs, options.pages)
+        scene.set_up(options.prefix, options.programs, options.pages, narrator)
+        if options.login:
+            stage.install_login(options.login, WWW + "/webman/login.cgi", 0o4750)
         if options.serve:
-            serve(scene, options.serve, options.sockets)
+            serve(scene, narrator, options.serve, options.login, options.sockets)
         else:
             visits(scene, options.screenshots)
         return 0

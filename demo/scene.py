@@ -1,6 +1,7 @@
 """The scene: the device, its clients at a provider, and a person who is known there."""
 
 import dataclasses
+import os
 import re
 import secrets
 import sys
@@ -11,7 +12,8 @@ from providers.glewlwyd import Glewlwyd
 from servers import Lighttpd
 
 DEVICE, PROVIDER = "device.localhost", "provider.localhost"
-STARTED = time.monotonic()
+# One clock for the run: the scripts pass on when it began.
+STARTED = float(os.environ.get("SSOCLIENT_STARTED", time.time()))
 
 
 class StepError(Exception):
@@ -35,7 +37,7 @@ class Client:
 
 
 def say(text):
-    print(f"[{time.monotonic() - STARTED:5.1f}s] {text}", flush=True)
+    print(f"[{time.time() - STARTED:5.1f}s] {text}", flush=True)
 
 
 def shown(url):
@@ -74,9 +76,11 @@ class Scene:
         self.settings = {}
         self.users = {"azure": "PLANT7.EXAMPLE.NET\\alice", "websphere": "alice"}
 
-    def set_up(self, prefix, programs, pages):
+    def set_up(self, prefix, programs, pages, narrator=None):
         say("device: private names, certificate authority, system log")
         self.stage.build()
+        if narrator is not None:
+            narrator.set_up()
         say(f"device: library, login program (set-id root), web server on {self.stage.device}")
         self.stage.install(prefix, programs, pages)
         self.server = Lighttpd(self.stage)

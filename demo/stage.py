@@ -74,6 +74,7 @@ class SystemLog:
 
     def __init__(self, path="/dev/log"):
         self.lines = []
+        self.heard = lambda line: None  # called with each line
         self._socket = socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM)
         self._socket.bind(path)
         os.chmod(path, 0o666)
@@ -88,6 +89,7 @@ class SystemLog:
                 self._marked.set()
             else:
                 self.lines.append(line)
+                self.heard(line)
 
     def catch_up(self):
         """Waits until all that was sent before is in `lines`."""
@@ -104,6 +106,8 @@ class Stage:
         self.device_port = device_port
         self.provider_name = provider_name
         self.provider_port = provider_port
+        # Where the servers listen; a relay in front of them may have the ports above (narrate.py).
+        self.device_listens, self.provider_listens = device_port, provider_port
         self.folder = FOLDER
         self.authority = FOLDER + "/ca.pem"
         self.logs = FOLDER + "/logs"

@@ -6,6 +6,10 @@ import urllib.parse
 from chromium import TabError
 from scene import StepError, say, shown
 
+CLIENTS = {"azure": "the client for Azure AD, whose ID tokens are checked with a published key "
+                    "(RS256)",
+           "websphere": "the client for WebSphere, whose ID tokens are checked with the client "
+                        "secret (HS256)"}
 SCREEN = {"width": 760, "height": 560, "deviceScaleFactor": 1, "mobile": False}
 PHONE = {"width": 390, "height": 700, "deviceScaleFactor": 1, "mobile": True}
 
@@ -98,9 +102,10 @@ class Visit:
         """What happened, in one sentence."""
         provider = self.scene.provider
         end = "the device's page" if provider.comes_back else "the provider's page"
-        return (f"{self.name}: {self.scene.person.account} signed in at {provider.title}, was "
-                f"{self.scene.expected(self.profile)} on the device, and signed out, which ended "
-                f"on {end}; the next sign-in asks for the password")
+        profile = provider.setups[self.profile][0]
+        return (f"{self.name}: {CLIENTS[profile]}. {self.scene.person.account} signed in at "
+                f"{provider.title}, was {self.scene.expected(self.profile)} on the device, and "
+                f"signed out, which ended on {end}; the next sign-in asked for the password.")
 
 
 class Pictures:

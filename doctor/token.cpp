@@ -2,6 +2,7 @@
 //
 // Each check is put to the library with a token that is right up to that check, so that both
 // faults of a token are reported.
+#include <iomanip>
 #include <iostream>
 
 #include "doctor/checkup.h"
@@ -15,16 +16,13 @@ namespace doctor {
 
 namespace {
 
-constexpr size_t kLongestToken = 1 << 20;
+constexpr int kLongestToken = 1 << 20;
 constexpr char kNotSupported[] = " algorithm is not supported";
 
 std::string ReadToken() {
-  std::string token(kLongestToken, '\0');
-  std::cin.read(token.data(), static_cast<std::streamsize>(token.size()));
-  token.resize(static_cast<size_t>(std::cin.gcount()));
-  const size_t begin = token.find_first_not_of(" \t\r\n");
-  if (begin == std::string::npos) return "";
-  return token.substr(begin, token.find_last_not_of(" \t\r\n") - begin + 1);
+  std::string token;
+  std::cin >> std::setw(kLongestToken) >> token;
+  return token;
 }
 
 class TokenCheck {
@@ -52,7 +50,6 @@ class TokenCheck {
     }
     CheckSignature();
     CheckName();
-    CheckIssuer();
     AddVerdict();
   }
 
@@ -122,11 +119,24 @@ class TokenCheck {
               (left < 0 ? Span(left) + " ago" : "in " + Span(left));
     }
     if (Passed(reply, "id_token expired.")) return Good("token-expiry", "exp", seen);
-    Fail("token-expired", "exp", known ? "The token has expired: " + seen : seen,
-         known ? "Pass a fresh token. If it is fresh, set this device's clock (" +
-                     Time(time(nullptr)) + ")."
-               : "Let the provider give \"exp\" as a number of seconds.",
-         reply.said);
+    if (!known) {
+      return Fail("token-expired", "exp", seen,
+                  "Let the provider give \"exp\" as a number of seconds.", reply.said);
+    }
+    const Checkup::ServerTime* const server =
+        checkup.server_times.empty() ? nullptr : &checkup.server_times[0];
+    if (server == nullptr || expiry < server->theirs) {
+      return Fail("token-expired", "exp", "The token has expired: " + seen,
+                  "Pass a fresh token. If it is fresh, set this device's clock (" +
+                      Time(time(nullptr)) + ").",
+                  reply.said);
+    }
+    const long long ahead = static_cast<long long>(server->ours) - server->theirs;
+    Fail("token-expired", "exp",
+         "The token has expired for this device only, whose clock is " + Span(ahead) +
+             " ahead of that of " + server->server + ": " + seen,
+         "Set this device's clock, best with a time service (NTP): date -u; timedatectl",
+         reply.said, "clock-ahead");
   }
 
   bool ParseExpiry(long long& expiry) const {
@@ -223,20 +233,24 @@ class TokenCheck {
          reply.said);
   }
 
-  // --- user name and issuer
-
   void CheckName() {
     const Reply reply = checkup.library.UserName(token);
     const char* const claim = azure ? "unique_name, email" : "sub";
+    const std::string named = StringOf(claims, "unique_name");
+    if (azure && AddIfGuest(checkup, named.empty() ? StringOf(claims, "email") : named,
+                            {kStandardInput, claim}, reply.said)) {
+      return;
+    }
     if (reply.result.isString()) {
       user = reply.result.asString();
       return Good("token-name", claim, "The user is " + Quote(Shown(user, 100)));
     }
     if (reply.Threw("cannot find the user name!")) {
       return Fail("token-no-name", claim, "The token has no user name",
-                  azure ? "Add the optional claim \"email\" (v2.0 tokens) or \"unique_name\" (v1.0 "
-                          "tokens) at the provider."
-                        : "Let the provider give \"sub\" as a string.",
+                  azure
+                      ? "Add the optional claim \"email\" for ID tokens under App registrations > "
+                        "the application > Token configuration."
+                      : "Let the provider give \"sub\" as a string.",
                   reply.said);
     }
     if (reply.Threw("QOVAWinsUserNameFqdn2Netbios failed.")) {
@@ -247,17 +261,6 @@ class TokenCheck {
     }
     Fail("token-name-form", claim, "The user name is not an account, \"@\" and a DNS domain",
          "Let the provider put account@dns.domain into the claim.", reply.said);
-  }
-
-  void CheckIssuer() {
-    const std::string issuer = StringOf(claims, "iss");
-    if (checkup.issuer.empty() || issuer == checkup.issuer) return;
-    checkup.report.Warn("token-other-issuer",
-                        Seen(claims, "iss") + "; that of the discovery document is " +
-                            Quote(Shown(checkup.issuer, 100)),
-                        {kStandardInput, "iss"},
-                        "Check that token endpoint and discovery document belong together.",
-                        {Said::Does("does not check the issuer")});
   }
 
   // --- all checks at once

@@ -86,7 +86,7 @@ class Glewlwyd:
     def start(self):
         self._files()
         self._stage.spawn("glewlwyd", ["glewlwyd", "-c", self._folder + "/glewlwyd.conf"], USER)
-        self._stage.wait_for("glewlwyd", self._stage.provider_port)
+        self._stage.wait_for("glewlwyd", self._stage.provider_listens)
         self._take_over()
         self._add_person()
 
@@ -106,7 +106,7 @@ class Glewlwyd:
         types = ", ".join(f'{{ extension = "{extension}" mime_type = "{kind}" }}'
                           for extension, kind in TYPES.items())
         write(folder + "/glewlwyd.conf", CONFIG.format(
-            port=self._stage.provider_port, url=self.url, folder=folder, types=types, log=log,
+            port=self._stage.provider_listens, url=self.url, folder=folder, types=types, log=log,
             certificate=certificate, authority=self._stage.authority))
         for path in (folder, folder + "/glewlwyd.db", folder + "/tls.key"):
             os.chown(path, owner, 0)
@@ -126,7 +126,7 @@ class Glewlwyd:
         return self._administrator.call(method, f"{self.url}/api/{path}", value)
 
     def _take_over(self):
-        """The packaged database has a known administrator: gives it a password of its own."""
+        """The packaged database has a known administrator: gives it its own password."""
         self._administrator = Browser(self._stage.authority)
         self._api("POST", "auth/", {"username": "admin", "password": "password"})
         self._api("PUT", "profile/password", {"old_password": "password",

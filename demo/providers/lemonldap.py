@@ -135,7 +135,7 @@ class LemonLDAP:
         certificate, key = self._stage.certificate(self._stage.provider_name)
         path = self._folder + "/lighttpd.conf"
         write(path, SERVER.format(
-            port=self._stage.provider_port, user=WEB_USER, share=SHARE, folder=self._folder,
+            port=self._stage.provider_listens, user=WEB_USER, share=SHARE, folder=self._folder,
             here=self._folder, certificate=certificate, key=key,
             log=self._stage.log_file("lemonldap", WEB_USER)))
         run("chown", "-R", WEB_USER, self._folder)
@@ -143,7 +143,7 @@ class LemonLDAP:
         os.mkdir(self._folder + "/cache")
         os.chown(self._folder + "/cache", pwd.getpwnam(WEB_USER).pw_uid, 0)
         self._stage.spawn("lemonldap", ["lighttpd", "-D", "-f", path])
-        self._stage.wait_for("lemonldap", self._stage.provider_port)
+        self._stage.wait_for("lemonldap", self._stage.provider_listens)
 
     def _values(self):
         def storage(name):

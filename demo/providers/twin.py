@@ -162,7 +162,7 @@ class Twin(Site):
 
     def start(self):
         self.prepare()
-        self.listen(self._stage.provider_port,
+        self.listen(self._stage.provider_listens,
                     self._stage.certificate(self._stage.provider_name))
 
     def sign_in(self, browser, page):

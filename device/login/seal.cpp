@@ -1,8 +1,5 @@
 #include "seal.h"
 
-#include <openssl/evp.h>
-#include <openssl/hmac.h>
-
 #include <stdexcept>
 
 #include "identity.h"
@@ -12,6 +9,8 @@
 namespace {
 
 constexpr size_t kKeySize = 32;
+constexpr size_t kBlock = 64;
+static_assert(kKeySize <= kBlock);
 
 // Whoever is first makes the key. The lock keeps others from reading a part of it.
 std::string Key() {
@@ -28,13 +27,12 @@ std::string Key() {
 
 std::string Seal(const std::string& text) {
   static const std::string key = Key();
-  std::string seal(EVP_MAX_MD_SIZE, '\0');
-  unsigned size = 0;
-  if (HMAC(EVP_sha256(), key.data(), static_cast<int>(key.size()),
-           reinterpret_cast<const unsigned char*>(text.data()), text.size(),
-           reinterpret_cast<unsigned char*>(&seal[0]), &size) == nullptr) {
-    throw std::runtime_error("no seal");
+  // RFC 2104, for a key that is shorter than a block.
+  std::string inner(kBlock, '\x36');
+  std::string outer(kBlock, '\x5c');
+  for (size_t i = 0; i < key.size(); ++i) {
+    inner[i] = static_cast<char>(inner[i] ^ key[i]);
+    outer[i] = static_cast<char>(outer[i] ^ key[i]);
   }
-  seal.resize(size);
-  return Hex(seal);
+  return Digest(outer + DigestBytes(inner + text));
 }

@@ -7,7 +7,8 @@
 // made at first use. Throws std::runtime_error if the key cannot be read or made.
 std::string Seal(const std::string& text);
 
-// Digest returns the SHA-256 digest of a text, hexadecimal.
+// DigestBytes and Digest return the SHA-256 digest of a text, as it is and hexadecimal.
+std::string DigestBytes(const std::string& text);
 std::string Digest(const std::string& text);
 
 // SameText compares in a time that does not depend on the texts, only on their length.

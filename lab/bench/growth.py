@@ -1,5 +1,4 @@
-"""How cost grows with the size of tokens, key sets and answers, in instructions; and the picture."""
-import math
+"""How cost grows with the size of tokens, key sets and answers, in instructions."""
 
 TOKENS = [1 << 10, 1 << 12, 1 << 14, 1 << 16, 1 << 18, 1 << 20]
 KEYS = [1, 10, 100, 300, 1000]
@@ -7,7 +6,7 @@ ANSWERS = [1 << 10, 10 << 10, 100 << 10, 1 << 20, 10 << 20]
 
 
 class Curve:
-    """One picture: sizes, and the counts of the library, of the floor and of the parser alone."""
+    """One table: sizes, and the counts of the library, of the floor and of the parser alone."""
 
     def __init__(self, title, unit, sizes, operation, parser=None, first=False):
         self.title = title
@@ -46,61 +45,3 @@ def measure_all(programs):
         Curve("the first login of a process", "keys in the key set", KEYS, "login-keys-%d",
               "parse-keys-%d", first=True),
         Curve("a request", "bytes of answer", ANSWERS, "answer-%d"))]
-
-
-WIDTH, HEIGHT, LEFT, BOTTOM, TOP = 300, 240, 60, 40, 30
-COLOURS = {"library": "#c03030", "by hand": "#3050a0", "parser": "#409040"}
-
-
-def picture(curves):
-    """The curves side by side, on logarithmic axes."""
-    parts = ['<svg xmlns="http://www.w3.org/2000/svg" width="%d" height="%d" '
-             'font-family="sans-serif" font-size="11">' % ((WIDTH + LEFT + 20) * len(curves),
-                                                          HEIGHT + TOP + BOTTOM),
-             '<rect width="100%" height="100%" fill="white"/>']
-    for index, curve in enumerate(curves):
-        parts.append('<g transform="translate(%d,%d)">' % (
-            index * (WIDTH + LEFT + 20) + LEFT, TOP))
-        parts += panel(curve)
-        parts.append("</g>")
-    return "\n".join(parts + ["</svg>"]) + "\n"
-
-
-def panel(curve):
-    counts = [count for line in curve.lines.values() for count in line]
-    across = axis(min(curve.sizes), max(curve.sizes), 0, WIDTH)
-    up = axis(10 ** math.floor(math.log10(min(counts))), 10 ** math.ceil(math.log10(max(counts))),
-              HEIGHT, 0)
-    parts = ['<rect width="%d" height="%d" fill="none" stroke="#888"/>' % (WIDTH, HEIGHT),
-             text(WIDTH / 2, -12, "instructions for " + curve.title, "middle"),
-             text(WIDTH / 2, HEIGHT + 32, curve.unit, "middle")]
-    for size in curve.sizes:
-        parts.append(text(across(size), HEIGHT + 15, short(size), "middle"))
-    power = math.floor(math.log10(min(counts)))
-    while power <= math.ceil(math.log10(max(counts))):
-        parts.append(text(-5, up(10 ** power) + 4, "10^%d" % power, "end"))
-        power += 1
-    for number, (label, line) in enumerate(curve.lines.items()):
-        points = " ".join("%.1f,%.1f" % (across(size), up(count))
-                          for size, count in zip(curve.sizes, line))
-        parts.append('<polyline points="%s" fill="none" stroke="%s" stroke-width="%s"/>' % (
-            points, COLOURS[label], 3 if label == "by hand" else 1.5))
-        parts.append('<text x="10" y="%d" fill="%s">%s</text>' % (
-            18 + 15 * number, COLOURS[label], label))
-    return parts
-
-
-def axis(low, high, begin, end):
-    """Maps low..high to begin..end, logarithmically."""
-    span = math.log(high / low)
-    return lambda value: begin + (end - begin) * math.log(value / low) / span
-
-
-def text(x, y, what, anchor):
-    return '<text x="%.1f" y="%.1f" text-anchor="%s">%s</text>' % (x, y, anchor, what)
-
-
-def short(size):
-    if size >= 1 << 20:
-        return "%dM" % (size >> 20)
-    return "%dK" % (size >> 10) if size >= 1 << 10 else str(size)

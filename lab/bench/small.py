@@ -93,8 +93,7 @@ def write(arm, rows):
         "# What the library costs on small processors",
         "Made by `scripts/check bench --small` on %s: 32-bit ARM (armhf) under QEMU, which counts "
         "instructions; memory of 32-bit programs (i386) on this machine's own processor. "
-        "[RESULTS.md](RESULTS.md) says what the rows mean. Times of an emulator mean nothing, and "
-        "are left out." % datetime.date.today().isoformat(),
+        "Times of an emulator mean nothing, and are left out." % datetime.date.today().isoformat(),
         "## Instructions within a process, armhf",
         report.table(("work", "by hand", "library", "ratio"), operations),
         "## Instructions of programs that make no request, armhf",
@@ -125,11 +124,7 @@ def main(arguments):
                       authority)
     finally:
         provider.end()
-    text = write(arm, rows)
-    with open(os.path.join(HERE, "SMALL.md"), "w") as file:
-        file.write(text)
-    print(text)
-    run.say(started, "written to lab/bench/SMALL.md")
+    print(write(arm, rows))
     return 0
 
 

@@ -1,11 +1,15 @@
-"""What the login program does for an honest user, and against everybody else."""
+"""What the login program does for an honest user, and against everyone else."""
 
 import base64
 import concurrent.futures
+import hashlib
+import hmac
 import json
 import os
 import re
+import socket
 import subprocess
+import threading
 import time
 import unittest
 import urllib.parse
@@ -42,6 +46,17 @@ class Start(DeviceTest):
         self.assertEqual(attributes, ["Path", "/", "Secure", "HttpOnly", "SameSite", "Lax",
                                       "Max-Age", "600"])
         self.assertEqual(state["origin"], "/index.cgi")
+
+    def test_seal(self):
+        """An HMAC of name, time and state, under the key that only root can read."""
+        page = self.start()
+        name, value = re.match("__Host-login-([^=]*)=([^;]*);", page.headers["Set-Cookie"]).groups()
+        made, seal = value.split("-")
+        with open(STORE + "/key", "rb") as file:
+            key = file.read()
+        self.assertEqual(len(key), 32)
+        text = f"login {name} {made} {values_of(page.location)['state']}"
+        self.assertEqual(seal, hmac.new(key, text.encode(), hashlib.sha256).hexdigest())
 
     def test_every_login_has_a_cookie_and_a_state_of_its_own(self):
         first, second = self.start(), self.start()
@@ -131,7 +146,7 @@ class Callback(DeviceTest):
                                     "nonce does not belong to this login", browser=attacker)
 
     def test_stolen_code_and_a_state_made_to_fit(self):
-        """The attacker writes the victim's nonce into the state of a login of his own."""
+        """The attacker writes the victim's nonce into the state of his own login."""
         victims = self.callback_url()
         attacker = self.new_browser()
         own = self.callback_url(attacker)
@@ -464,6 +479,14 @@ class SetUp(DeviceTest):
                     self.assert_refused(self.start(), "not-set-up",
                                         f"{path}: {profile}_{key} is missing or no URL")
 
+    def test_line_break_in_the_endpoint(self):
+        """It does not begin another header."""
+        self.change("websphere", authorization_endpoint=self.device.provider.url + "/a\nSet-Cookie: a=b\n\n")
+        out = self.run_program("action=start")
+        self.assertIn("#reason=internal.", out)
+        self.assertNotIn("a=b", out)
+        self.assert_logged("control character in a header")
+
     def test_profile_missing(self):
         os.unlink("/usr/qova/etc/ssoclient/profile.conf")
         self.assert_refused(self.start(), "disabled", "sso does not enable.")
@@ -529,6 +552,23 @@ class Options(DeviceTest):
         os.unlink(self.PATH)
         os.mkfifo(self.PATH)
         self.reference(self.start(), "internal")
+
+    def test_proxy(self):
+        """The way through a proxy comes from the file, not from the environment."""
+        with socket.create_server(("127.0.0.1", 0)) as proxy:
+            proxy.settimeout(10)
+            address = f"127.0.0.1:{proxy.getsockname()[1]}"
+            url = self.callback_url()
+            self.device.options(proxy="http://" + address, deadline=5)
+            thread = threading.Thread(target=self.browser.get, args=(url,))
+            thread.start()
+            connection, _ = proxy.accept()
+            with connection:
+                asked = connection.recv(1000).decode()
+            thread.join(30)
+            self.assertTrue(asked.startswith("CONNECT provider.localhost:8444 HTTP/1.1"), asked)
+            self.device.options(proxy="http://" + address, no_proxy="other.example.org,.localhost")
+            self.assert_signed_in(self.sign_in(), "websphere")
 
     def test_no_file(self):
         os.unlink(self.PATH)

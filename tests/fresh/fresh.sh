@@ -1,22 +1,24 @@
 # A fresh Debian in a folder, for the scripts that need one. Sourced after lib.sh, never run.
 
-fresh_base=$root/build/fresh/base
-
-# make_fresh_base [SUITE]: debootstraps the system once, Debian 12 or another; it is copied for
-# every use.
+# make_fresh_base [SUITE]: debootstraps the system once (default: Debian 12), from the mirror that
+# this machine uses; it is copied for every use.
 make_fresh_base() {
-  local suite=${1:-bookworm}
+  local suite=${1:-bookworm} mirror
   need_root
-  [ $# -eq 0 ] || fresh_base=$root/build/fresh/base-$suite
+  fresh_base=$root/build/fresh/base-$suite
   [ ! -e "$fresh_base/.complete" ] || return 0
   command -v debootstrap >/dev/null || apt-get install -y --no-install-recommends debootstrap >/dev/null ||
     die "needs debootstrap"
   rm -rf "$fresh_base"
   mkdir -p "$fresh_base"
+  mirror=$(sed -nE 's/^URIs: *([^ ]+).*/\1/p; s/^deb +(\[[^]]*\] *)?([^ ]+).*/\2/p' \
+    /etc/apt/sources.list /etc/apt/sources.list.d/*.sources 2>/dev/null | head -n 1) || true
+  say "a fresh $suite: about 100 MB to download, 400 MB on disk, 2 minutes"
   quietly "debootstrap of $suite" \
-    debootstrap --merged-usr --variant=minbase "$suite" "$fresh_base" || die "debootstrap failed"
+    debootstrap --merged-usr --variant=minbase "$suite" "$fresh_base" $mirror ||
+    die "debootstrap failed: does the mirror $mirror carry $suite?"
   # A minimal system has no updates and security suites; a fresh installation has.
-  if [ $# -eq 0 ] && cp /etc/apt/sources.list.d/debian.sources \
+  if [ "$suite" = "$(. /etc/os-release && echo "${VERSION_CODENAME:-}")" ] && cp /etc/apt/sources.list.d/debian.sources \
     "$fresh_base/etc/apt/sources.list.d/" 2>/dev/null; then
     : >"$fresh_base/etc/apt/sources.list"
   fi
