@@ -67,7 +67,7 @@ void CloseOneByOne() {
   }
 }
 
-// Descriptors 0 to 2 are open, all others closed: what the program opens gets a number of its own.
+// Descriptors 0 to 2 are open, all others closed: no file of the program gets a standard number.
 void ResetDescriptors() {
   int file = open("/dev/null", O_RDWR);
   while (file >= 0 && file <= STDERR_FILENO) file = open("/dev/null", O_RDWR);

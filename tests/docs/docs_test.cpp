@@ -195,6 +195,7 @@ TEST(DoctorPage, HoldsEveryFinding) {
                         "token-name",
                         "token-accepted",
                         "ssoclient-doctor",
+                        "www-data",
                         "authorization-endpoint",
                         "date",
                         "www-authenticate",
