@@ -1,4 +1,5 @@
-// The shortest login program, which works and withstands little: for the test of scripts/check login.
+// The shortest login program, which works and withstands little: for the test of
+// scripts/check login.
 #include <cstdlib>
 #include <exception>
 #include <iostream>
