@@ -1,4 +1,4 @@
-"""A device and twins of both providers, all in order: a fault spoils one thing, and all is put back.
+"""A device and twins of both providers, in order: a fault spoils one thing, and all is put back.
 
 The sign-in is the library's own. The browser is not on the device: it reaches the twins by a call,
 whatever the device's network does. The doctor runs as installed.
@@ -60,7 +60,8 @@ class Place:
         self.stage = Stage(DEVICE, PROVIDER, 443, 443)
         self.stage.build()
         build = os.environ["SSOCLIENT_BUILD"]
-        self.stage.install(build + "/demo/prefix", build + "/demo/device", HERE + "/../../device/www")
+        self.stage.install(build + "/demo/prefix", build + "/demo/device",
+                           HERE + "/../../device/www")
         self.stage.install_login(build + "/doctor/sign_in", HELPER, 0o4750)
         os.makedirs(QOVA + "/bin", exist_ok=True)
         shutil.copy(build + "/doctor/doctor/ssoclient-doctor", DOCTOR)
