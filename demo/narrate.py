@@ -114,7 +114,12 @@ class Relay:
         server = _Server(("127.0.0.1", port), type("Handler", (_Handler,), {"relay": self}))
         server.socket = context.wrap_socket(server.socket, server_side=True,
                                             do_handshake_on_connect=False)
-        threading.Thread(target=server.serve_forever, daemon=True).start()
+        threading.Thread(target=server.serve_forever, args=(0.05,), daemon=True).start()
+        self._server = server
+
+    def close(self):
+        self._server.shutdown()
+        self._server.server_close()
 
 
 def quoted(text, longest=120):
@@ -141,15 +146,25 @@ class Narrator:
         self._asked = set()   # states that a browser brought to the provider
         self._token = ""      # what the last ID token was signed with, until it is judged
         self._pending = threading.Lock()
+        self._relays = []
 
     def set_up(self):
         """Puts the relays in front of the servers; must be called before those start."""
         stage = self._stage
         stage.device_listens, stage.provider_listens = stage.device_port + 2, stage.provider_port + 2
-        Relay(stage, stage.device_name, stage.device_port, stage.device_listens,
-              self._if_set(self._device_asked), self._if_set(self._device_answered))
-        Relay(stage, stage.provider_name, stage.provider_port, stage.provider_listens,
-              self._if_set(self._provider_asked), self._if_set(self._provider_answered))
+        self._relays = [
+            Relay(stage, stage.device_name, stage.device_port, stage.device_listens,
+                  self._if_set(self._device_asked), self._if_set(self._device_answered)),
+            Relay(stage, stage.provider_name, stage.provider_port, stage.provider_listens,
+                  self._if_set(self._provider_asked), self._if_set(self._provider_answered))]
+
+    def close(self):
+        """Takes the relays away again."""
+        stage = self._stage
+        stage.device_listens, stage.provider_listens = stage.device_port, stage.provider_port
+        stage.log.heard = lambda line: None
+        for relay in self._relays:
+            relay.close()
 
     def begin(self, settings):
         """Says what happens from now on, with a client of those settings."""

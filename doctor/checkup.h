@@ -11,6 +11,7 @@
 #include "doctor/library.h"
 #include "doctor/options.h"
 #include "doctor/report.h"
+#include "doctor/url.h"
 
 namespace doctor {
 
@@ -30,10 +31,17 @@ struct Checkup {
   std::set<std::string> bad_urls;  // not worth a request: there is a finding
   std::string tenant;              // the library has no accessor for it
   std::string network_obstacle;    // the finding that kept the key set away
+  Json::Value discovery;           // the document; null: there is none
   std::string issuer;              // of the discovery document
   Json::Value key_set;
+  long transfer_milliseconds = 0;  // of all requests
 
   bool azure() const { return provider == Provider::kAzure; }
+  // True if the URLs have the form of Entra ID's: then its rules are known.
+  bool entra() const {
+    return azure() && (ShapeOf(settings.authorization_endpoint).version > 0 ||
+                       ShapeOf(settings.token_endpoint).version > 0);
+  }
   // The settings key with the provider's prefix, and where it is.
   std::string Key(const std::string& name) const {
     return (azure() ? "azure_" : "websphere_") + name;
@@ -43,6 +51,9 @@ struct Checkup {
     return !url.empty() && bad_urls.count(url) == 0;
   }
   Place At(const std::string& name) const { return {settings_file, Key(name)}; }
+
+  // The URL that the discovery document has in place of a configured one; empty: none or the same.
+  std::string Documented(const std::string& name, const std::string& configured) const;
 
   struct ServerTime {
     std::string server;
@@ -62,14 +73,26 @@ void CheckFiles(Checkup& checkup);
 // settings.cpp: the values of the chosen provider's settings.
 void CheckSettings(Checkup& checkup);
 
-// endpoints.cpp: discovery document, key set and token endpoint, over the network.
+// consistency.cpp: that the URLs are those of the endpoints, of one tenant and of one version.
+void CheckConsistency(Checkup& checkup);
+
+// endpoints.cpp: discovery document, authorization and token endpoint, and key set.
 void CheckEndpoints(Checkup& checkup);
+
+// authorization.cpp: what a browser gets at the authorization endpoint.
+void CheckAuthorization(Checkup& checkup);
+
+// redirect.cpp: that the browser comes back to the login program.
+void CheckRedirect(Checkup& checkup);
 
 // clock.cpp: this device's clock against the servers'.
 void CheckClock(Checkup& checkup);
 
-// name.cpp: the conversion of one user name.
+// name.cpp: the directory service, and the conversion of one user name.
 void CheckName(Checkup& checkup);
+// True, and in the report, if the name is that of a guest in a tenant of Entra ID.
+bool AddIfGuest(Checkup& checkup, const std::string& name, const Place& place,
+                const std::vector<Said>& said);
 
 // token.cpp: a token from standard input, check by check.
 void CheckToken(Checkup& checkup);

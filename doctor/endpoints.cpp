@@ -1,6 +1,7 @@
 // What the provider answers: discovery document, key set, token endpoint.
 #include <cstdlib>
 
+#include "doctor/answer.h"
 #include "doctor/checkup.h"
 #include "doctor/claims.h"
 #include "doctor/json.h"
@@ -14,6 +15,8 @@
 namespace doctor {
 
 namespace {
+
+constexpr long kSlow = 1000;  // milliseconds that a person notices
 
 // The proxies of this process, with the passwords that their URLs may hold.
 void NoteProxy(Checkup& checkup) {
@@ -31,46 +34,24 @@ std::vector<Said> WithoutDiscovery(const Checkup& checkup) {
   return checkup.library.Verify(MakeToken(GoodHeader(checkup), GoodClaims(checkup))).said;
 }
 
-void CompareEndpoint(Checkup& checkup, const Json::Value& document, const char* member,
-                     const char* key, const std::string& configured) {
-  const std::string named = StringOf(document, member);
-  if (named.empty() || configured.empty() || named == configured) return;
+// A URL that works, though the document has another one.
+void CompareEndpoint(Checkup& checkup, const char* key, const std::string& configured) {
+  const std::string there = checkup.Documented(key, configured);
   Place place = checkup.At(key);
   place.url = Shown(configured, 200);
-  checkup.report.Add(
-      {"discovery-differs",
-       Grade::kWarning,
-       "The discovery document names another " + std::string(member) + ": " + Shown(named, 200),
-       place,
-       "Set " + checkup.Key(key) + " to what the document names, unless the other one is meant.",
-       {Said::Does("uses the configured one and does not compare")}});
-}
-
-// The part of an issuer that is a tenant's ID, if there is one.
-std::string TenantOf(const std::string& issuer) {
-  for (size_t at = 0; at + 36 <= issuer.size(); ++at) {
-    const std::string part = issuer.substr(at, 36);
-    if (IsGuid(part)) return part;
+  if (there.empty() || configured.empty() || !checkup.IsWorthRequest(configured) ||
+      checkup.report.HasAt(place.url)) {
+    return;
   }
-  return "";
-}
-
-void CompareTenant(Checkup& checkup) {
-  const std::string tenant = TenantOf(checkup.issuer);
-  if (!checkup.azure() || tenant.empty() || tenant == checkup.tenant) return;
-  Json::Value claims = GoodClaims(checkup);
-  claims["tid"] = tenant;
-  checkup.report.Fail("discovery-other-tenant",
-                      "The discovery document is that of the tenant " + tenant +
-                          "; configured is " + Quote(Shown(checkup.tenant, 80)),
-                      checkup.At("tenant_id"),
-                      "Set azure_tenant_id and the URLs to the same tenant.",
-                      checkup.library.VerifyOffline(MakeToken(GoodHeader(checkup), claims)).said);
+  checkup.report.Warn("discovery-differs",
+                      "The discovery document has another URL: " + Shown(there, 200), place,
+                      "If sign-ins fail, set " + checkup.Key(key) + " to that one.",
+                      {Said::Does("uses the configured one and does not compare")});
 }
 
 // Adds what is wrong with the document as a whole. True if it is a discovery document.
-bool CheckDocument(Checkup& checkup, const Destination& destination, const WebAnswer& answer,
-                   Json::Value& document) {
+bool CheckDocument(Checkup& checkup, const Destination& destination, const WebAnswer& answer) {
+  Json::Value document;
   const bool parsed = ParseJson(answer.body, document);
   const auto add = [&](const char* id, const std::string& cause) {
     checkup.report.Add({id, destination.grave, cause + " (" + Describe(answer) + ")",
@@ -84,6 +65,13 @@ bool CheckDocument(Checkup& checkup, const Destination& destination, const WebAn
     return add("discovery-redirect", "The server redirects; the library does not follow");
   }
   if (!parsed) return add("discovery-no-json", "The discovery document is not JSON");
+  const Refusal refusal = RefusalIn(answer.body);
+  if (!refusal.code.empty() && !refusal.plain) {
+    checkup.report.Add({"discovery-refused", destination.grave,
+                        refusal.meaning + " (" + refusal.code + ")", At(destination, answer),
+                        refusal.action, WithoutDiscovery(checkup)});
+    return false;
+  }
   if (checkup.azure() && StringOf(document, "jwks_uri").empty()) {
     return add("discovery-no-keys",
                "The discovery document has no \"jwks_uri\"" +
@@ -92,29 +80,41 @@ bool CheckDocument(Checkup& checkup, const Destination& destination, const WebAn
   return true;
 }
 
-Json::Value CheckDiscovery(Checkup& checkup) {
-  const Settings& settings = checkup.settings;
-  Json::Value document;
-  if (!checkup.IsWorthRequest(settings.wellknown)) return document;
-  const Destination destination{"discovery document", settings.wellknown,
-                                checkup.azure() ? Grade::kFailure : Grade::kWarning,
-                                [&checkup] { return WithoutDiscovery(checkup); }};
-  WebAnswer answer;
-  if (!Exchange(checkup, destination, nullptr, answer)) return document;
-  if (!CheckDocument(checkup, destination, answer, document)) return Json::Value();
+// The discovery document: asked for first, because it says what the URLs should be, and reported
+// in the order of a sign-in.
+class Discovery {
+ public:
+  explicit Discovery(Checkup& checked)
+      : checkup(checked),
+        destination{"discovery document", checked.settings.wellknown,
+                    checked.azure() ? Grade::kFailure : Grade::kWarning,
+                    [&checked] { return WithoutDiscovery(checked); }} {
+    const std::string role = ShapeOf(destination.url).role;
+    sent = checkup.IsWorthRequest(destination.url) && (role.empty() || role == "wellknown");
+    if (!sent) return;
+    answer = Send(checkup, destination);
+    if (answer.code == CURLE_OK && ParseJson(answer.body, checkup.discovery)) {
+      checkup.issuer = StringOf(checkup.discovery, "issuer");
+    }
+  }
 
-  checkup.issuer = StringOf(document, "issuer");
-  CompareEndpoint(checkup, document, "authorization_endpoint", "authorization_endpoint",
-                  settings.authorization_endpoint);
-  CompareEndpoint(checkup, document, "token_endpoint", "token_endpoint", settings.token_endpoint);
-  CompareEndpoint(checkup, document, "end_session_endpoint", "logout_endpoint",
-                  settings.logout_endpoint);
-  CompareTenant(checkup);
-  return document;
-}
+  void Report() {
+    if (!sent) return;
+    if (!Judge(checkup, destination, answer) || !CheckDocument(checkup, destination, answer)) {
+      checkup.discovery = Json::Value();
+    }
+  }
+
+ private:
+  Checkup& checkup;
+  const Destination destination;
+  bool sent;
+  WebAnswer answer;
+};
 
 // The algorithms that the provider says it signs with. `kid`: of a key that can be used.
-void CheckAlgorithms(Checkup& checkup, const Json::Value& document, const std::string& kid) {
+void CheckAlgorithms(Checkup& checkup, const std::string& kid) {
+  const Json::Value& document = checkup.discovery;
   const std::string prefix = checkup.azure() ? "RS" : "HS";
   const Json::Value offered =
       document.isObject() ? document["id_token_signing_alg_values_supported"] : Json::Value();
@@ -138,26 +138,54 @@ void CheckAlgorithms(Checkup& checkup, const Json::Value& document, const std::s
                       checkup.library.Verify(MakeToken(header, GoodClaims(checkup))).said);
 }
 
+// libcurl reads all certificate authorities again for each request of a sign-in.
+void CheckBundle(Checkup& checkup) {
+  const long sent = static_cast<long>(checkup.report.Requests().size());
+  const long needed = checkup.azure() ? 3 : 1;
+  const long all = sent == 0 ? 0 : checkup.transfer_milliseconds * needed / sent;
+  const long reading = BundleMilliseconds() * needed;
+  const std::string cause = "libcurl takes " + std::to_string(reading) + " ms of the " +
+                            std::to_string(all) +
+                            " ms of a sign-in's requests to read the certificate authorities";
+  const Place place{TrustStore()};
+  if (2 * reading <= all || reading < kSlow) return checkup.report.Good("bundle", cause, place);
+  checkup.report.Warn("bundle-slow", cause, place,
+                      "Give the device a bundle with the provider's certificate authorities alone.",
+                      {Said::Does("reads the bundle once for each request")});
+}
+
 }  // namespace
 
 void CheckEndpoints(Checkup& checkup) {
   if (!checkup.settings_read) return;
+  Report& report = checkup.report;
   if (checkup.options.offline) {
-    return checkup.report.Good("offline", "No request was sent (--offline)");
+    CheckConsistency(checkup);
+    return report.Good("offline", "No request was sent (--offline)");
   }
   NoteProxy(checkup);
-  // In the order of a sign-in.
-  checkup.report.Begin("Token endpoint");
+  Discovery discovery(checkup);
+  report.Begin("URLs");
+  CheckConsistency(checkup);
+  report.Begin("Token endpoint");
   CheckTokenEndpoint(checkup);
-  checkup.report.Begin("Discovery document and key set");
-  const Json::Value document = CheckDiscovery(checkup);
+  report.Begin("Discovery document and key set");
+  discovery.Report();
   std::string kid;
-  if (checkup.azure() && document.isObject()) {
-    kid = CheckKeySet(checkup, StringOf(document, "jwks_uri"));
+  if (checkup.azure() && checkup.discovery.isObject()) {
+    kid = CheckKeySet(checkup, StringOf(checkup.discovery, "jwks_uri"));
   }
-  checkup.network_obstacle = checkup.report.Obstacle();
-  checkup.report.Begin("Signature algorithms");
-  if (!checkup.azure() || !kid.empty()) CheckAlgorithms(checkup, document, kid);
+  checkup.network_obstacle = report.Obstacle();
+  if (!checkup.azure() || !kid.empty()) CheckAlgorithms(checkup, kid);
+  report.Begin("Authorization endpoint");
+  CheckAuthorization(checkup);
+  report.Begin("URLs");
+  CompareEndpoint(checkup, "authorization_endpoint", checkup.settings.authorization_endpoint);
+  CompareEndpoint(checkup, "token_endpoint", checkup.settings.token_endpoint);
+  CompareEndpoint(checkup, "logout_endpoint", checkup.settings.logout_endpoint);
+  CheckBundle(checkup);
+  report.Begin("Redirect URI");
+  CheckRedirect(checkup);
 }
 
 }  // namespace doctor

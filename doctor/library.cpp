@@ -1,5 +1,6 @@
 #include "doctor/library.h"
 
+#include <dlfcn.h>
 #include <fcntl.h>
 #include <openssl/evp.h>
 #include <sched.h>
@@ -22,6 +23,10 @@ using QOVA::SSO::AzureSSOClient;
 using QOVA::SSO::SSOClient;
 using QOVA::SSO::SSOProfile;
 using QOVA::SSO::WebSphereSSOClient;
+
+// Of the form of Entra ID's codes, which it checks before the client.
+constexpr char kFalseCode[] =
+    "1.AXsocGllbnQtZG9jdG9yLWZhbHNl.ssoclient-doctor-sends-this-code-which-no-provider-gave-out";
 
 // A client that may be kept from the network, so that the checks before it can be asked for.
 class QuietAzureClient : public AzureSSOClient {
@@ -68,6 +73,25 @@ Json::Value Exchange(SSOClient& client, const std::string& body) {
 const EVP_MD* DigestOf(const std::string& algorithm) {
   const std::string size = algorithm.size() > 2 ? algorithm.substr(2) : "";
   return size == "512" ? EVP_sha512() : size == "384" ? EVP_sha384() : EVP_sha256();
+}
+
+// Winbind's client library, which only a library of that platform loads. Its functions return 0 on
+// success.
+Json::Value AskWinbind(const std::string& user) {
+  void* const library = dlopen("libwbclient.so.0", RTLD_LAZY | RTLD_NOLOAD);
+  if (library == nullptr) return {};
+  const auto ping = reinterpret_cast<int (*)()>(dlsym(library, "wbcPing"));
+  const auto lookup = reinterpret_cast<int (*)(const char*, const char*, void*, int*)>(
+      dlsym(library, "wbcLookupName"));
+  Json::Value state(Json::objectValue);
+  state["ping"] = ping != nullptr && ping() == 0;
+  const size_t slash = user.find('\\');
+  if (lookup == nullptr || slash == std::string::npos) return state;
+  unsigned char sid[256];  // more than a security identifier takes
+  int type = 0;
+  state["known"] =
+      lookup(user.substr(0, slash).c_str(), user.substr(slash + 1).c_str(), sid, &type) == 0;
+  return state;
 }
 
 }  // namespace
@@ -135,9 +159,22 @@ Reply Library::TokenRequest(const std::string& body) const {
 
 std::string Library::ExchangeBody() const {
   const Reply reply = AskClient([](SSOClient& client) {
-    client.SetCode("ssoclient-doctor");
+    client.SetCode(kFalseCode);
     return Json::Value(client.GetIDTokenReqParams());
   });
+  return reply.result.isString() ? reply.result.asString() : "";
+}
+
+std::string Library::AuthorizationRequest() const {
+  const Provider chosen = provider;
+  const Reply reply = Ask(
+      [chosen] {
+        const Json::Value state(Json::objectValue);
+        return Json::Value(chosen == Provider::kAzure
+                               ? AzureSSOClient().GetAccessTokenReqURI(state)
+                               : WebSphereSSOClient().GetAccessTokenReqURI(state));
+      },
+      seconds);
   return reply.result.isString() ? reply.result.asString() : "";
 }
 
@@ -203,6 +240,10 @@ Reply Library::UserName(const std::string& token) const {
     client.GetUserName(user);
     return Json::Value(user);
   });
+}
+
+Reply Library::Winbind(const std::string& user) const {
+  return Ask([user] { return AskWinbind(user); }, seconds);
 }
 
 }  // namespace doctor

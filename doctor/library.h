@@ -47,6 +47,8 @@ class Library {
   Reply TokenRequest(const std::string& body) const;
   // The body of a code exchange, client secret included, with a code that no provider gave out.
   std::string ExchangeBody() const;
+  // The authorization endpoint with the query of a sign-in.
+  std::string AuthorizationRequest() const;
 
   Reply Split(const std::string& token) const;   // Jwt: {"header", "body", "signature"}
   Reply Header(const std::string& token) const;  // Jwt::GetHeader
@@ -64,6 +66,9 @@ class Library {
                    const std::string& algorithm) const;
 
   Reply UserName(const std::string& token) const;  // GetUserName; the result is the name
+  // Winbind, if the library converts names with it: {"ping": true} and, of a user DOMAIN\account,
+  // {"known": true}; null without winbind.
+  Reply Winbind(const std::string& user) const;
 
  private:
   // Asks a new client of the provider.

@@ -30,6 +30,24 @@ void AddRefused(Checkup& checkup, const Reply& reply, const std::string& shown) 
   checkup.report.Add(finding);
 }
 
+// Winbind's state, and whether it knows the user, if one is given.
+void CheckWinbind(Checkup& checkup, const std::string& user) {
+  const Reply reply = checkup.library.Winbind(user);
+  if (reply.ended && !reply.result.isObject()) return;  // another platform
+  if (!reply.ended || !reply.result["ping"].asBool()) {
+    return checkup.report.Fail("directory-down",
+                               "Winbind, which converts user names, does not answer", {},
+                               "Start it: systemctl start winbind; wbinfo --ping",
+                               {Said::Does("cannot convert a name without it")});
+  }
+  if (user.empty()) return checkup.report.Good("directory", "Winbind answers");
+  if (reply.result["known"].asBool()) return;
+  checkup.report.Warn(
+      "name-unknown", "Winbind does not know the user " + Quote(Shown(user, 80)), {},
+      "Create the account in the directory, or check it: wbinfo -n " + Quote(Shown(user, 80)),
+      {Said::Does("signs the user in without looking the account up")});
+}
+
 // The form that the platform is given: DNS.DOMAIN\account.
 bool IsUnchanged(const std::string& principal, const std::string& user) {
   const size_t at = principal.find('@');
@@ -41,8 +59,22 @@ bool IsUnchanged(const std::string& principal, const std::string& user) {
 
 }  // namespace
 
+bool AddIfGuest(Checkup& checkup, const std::string& name, const Place& place,
+                const std::vector<Said>& said) {
+  const bool guest =
+      name.find("#EXT#") != std::string::npos || name.compare(0, 9, "live.com#") == 0;
+  if (!guest) return false;
+  checkup.report.Fail("name-guest",
+                      "The user " + Quote(Shown(name, 100)) +
+                          " is a guest of the tenant, whose name is not of the device's directory",
+                      place, "Sign in with an account of the directory instead of the guest's.",
+                      said);
+  return true;
+}
+
 void CheckName(Checkup& checkup) {
   const std::string& name = checkup.options.name;
+  if (checkup.azure()) CheckWinbind(checkup, "");
   if (name.empty()) return;
   const std::string shown = Quote(Shown(name, 80));
   if (checkup.provider != Provider::kAzure) {
@@ -53,9 +85,11 @@ void CheckName(Checkup& checkup) {
   Json::Value claims(Json::objectValue);
   claims["unique_name"] = name;
   const Reply reply = checkup.library.UserName(MakeToken(GoodHeader(checkup), claims));
+  if (AddIfGuest(checkup, name, {}, reply.said)) return;
   if (!reply.result.isString()) return AddRefused(checkup, reply, shown);
   const std::string user = reply.result.asString();
   const std::string becomes = "The name " + shown + " becomes " + Quote(Shown(user, 80));
+  CheckWinbind(checkup, user);
   if (!IsUnchanged(name, user)) return checkup.report.Good("name", becomes);
   checkup.report.Add(
       {"name-unchanged",

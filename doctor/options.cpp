@@ -23,7 +23,7 @@ Finds out why users cannot sign in to this device, and what to do about it. Run 
   --program FILE     the login program; checks that it can read the settings
   --name USER        converts the user name USER (account@dns.domain) as a sign-in does
   --token            reads an ID token from standard input and reports what each check says
-  --try-secret       sends the client secret, with a false code, to the token endpoint
+  --try-secret       sends the client secret to the token endpoint, and reports if it is accepted
   --offline          sends nothing
   --timeout SECONDS  the time for each request, 1 to 300 (default: 10)
   --explain TEXT     explains the codes and messages in a pasted text ("-": standard input)

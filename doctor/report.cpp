@@ -28,7 +28,9 @@ void Report::Add(Finding finding) {
   finding.cause = CleanWhole(finding.cause);
   finding.action = CleanWhole(finding.action);
   CleanPlace(finding.place);
-  for (Said& said : finding.detail) said.text = Clean(said.text);
+  for (Said& said : finding.detail) {
+    said.text = said.kind == Said::Kind::kDoes ? CleanWhole(said.text) : Clean(said.text);
+  }
   if (!finding.because.empty() && !Has(finding.because)) finding.because.clear();
   for (Entry& entry : entries) {
     if (entry.finding.grade != Grade::kGood && entry.finding.id == finding.id &&
@@ -56,6 +58,12 @@ void Report::AddRequest(Request request) {
 bool Report::Has(const std::string& id) const {
   return std::any_of(entries.begin(), entries.end(),
                      [&id](const Entry& entry) { return entry.finding.id == id; });
+}
+
+bool Report::HasAt(const std::string& url) const {
+  return std::any_of(entries.begin(), entries.end(), [&url](const Entry& entry) {
+    return entry.finding.grade == Grade::kFailure && entry.finding.place.url == url;
+  });
 }
 
 std::string Report::Obstacle() const {

@@ -46,6 +46,8 @@ class Report {
   void AddRequest(Request request);
 
   bool Has(const std::string& id) const;
+  // True if there is a failure about the URL.
+  bool HasAt(const std::string& url) const;
   // What keeps later checks from their work in the topic that was begun last: its first failure
   // or thing that could not be checked; empty if there is none.
   std::string Obstacle() const;

@@ -116,9 +116,9 @@ class EndpointCheck {
 };
 
 void Warn(Checkup& checkup, const char* id, const std::string& key, const std::string& cause,
-          const std::string& action, const std::vector<Said>& said) {
+          const std::string& action, const std::vector<Said>& said, Grade grade = Grade::kWarning) {
   checkup.report.Add(
-      {id, Grade::kWarning, Quote(checkup.Key(key)) + " " + cause, checkup.At(key), action, said});
+      {id, grade, Quote(checkup.Key(key)) + " " + cause, checkup.At(key), action, said});
 }
 
 // The check of a token whose claim is that of another.
@@ -131,18 +131,29 @@ std::vector<Said> WithOther(const Checkup& checkup, const char* claim) {
 void CheckAzureValues(Checkup& checkup) {
   const std::string& tenant = checkup.tenant;
   const std::string& client = checkup.settings.client_id;
+  // Entra ID writes IDs in lower case into its tokens; of other providers that is not known.
+  const Grade grade = checkup.entra() ? Grade::kFailure : Grade::kWarning;
   const std::string lower = "Write it in lower case, as tokens do: it is compared byte by byte.";
   if (!tenant.empty() && !IsGuid(tenant)) {
     Warn(checkup, "tenant-no-guid", "tenant_id",
          "is " + Quote(Shown(tenant, 80)) + ", not a tenant ID as Azure writes it into tokens",
-         "Set it to the directory (tenant) ID, not to a domain name.", WithOther(checkup, "tid"));
+         "Set it to the directory (tenant) ID, not to a domain name.", WithOther(checkup, "tid"),
+         grade);
   } else if (HasUpperCase(tenant)) {
     Warn(checkup, "id-upper-case", "tenant_id", "has upper-case letters: " + tenant, lower,
-         WithOther(checkup, "tid"));
+         WithOther(checkup, "tid"), grade);
   }
   if (IsGuid(client) && HasUpperCase(client)) {
     Warn(checkup, "id-upper-case", "client_id", "has upper-case letters: " + Shown(client, 40),
-         lower, WithOther(checkup, "aud"));
+         lower, WithOther(checkup, "aud"), grade);
+  }
+  if (IsGuid(checkup.settings.client_secret) && !IsGuid(client) && checkup.entra()) {
+    checkup.bad_urls.insert(
+        {checkup.settings.authorization_endpoint, checkup.settings.token_endpoint});
+    return checkup.report.Fail("secret-is-id", "Client ID and client secret are swapped",
+                               checkup.At("client_id"),
+                               "Exchange the values of azure_client_id and azure_client_secret.",
+                               {Said::Does("sends both unchanged; the provider refuses them")});
   }
   if (IsGuid(checkup.settings.client_secret)) {
     Warn(checkup, "secret-is-id", "client_secret", "looks like an ID, not like a secret",

@@ -12,11 +12,6 @@ namespace {
 
 constexpr char kAlphabet[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789-_";
 
-std::string LowerCase(std::string text) {
-  for (char& c : text) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return text;
-}
-
 bool IsSpace(char c) {
   return std::isspace(static_cast<unsigned char>(c)) != 0;
 }
@@ -38,6 +33,11 @@ size_t Distance(const std::string& one, const std::string& other) {
 }
 
 }  // namespace
+
+std::string LowerCase(std::string text) {
+  for (char& c : text) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
+  return text;
+}
 
 std::string Quote(const std::string& text) {
   return "\"" + text + "\"";

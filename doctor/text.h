@@ -7,6 +7,8 @@
 
 namespace doctor {
 
+std::string LowerCase(std::string text);  // of ASCII
+
 // The text in double quotes.
 std::string Quote(const std::string& text);
 

@@ -122,11 +122,24 @@ class TokenCheck {
               (left < 0 ? Span(left) + " ago" : "in " + Span(left));
     }
     if (Passed(reply, "id_token expired.")) return Good("token-expiry", "exp", seen);
-    Fail("token-expired", "exp", known ? "The token has expired: " + seen : seen,
-         known ? "Pass a fresh token. If it is fresh, set this device's clock (" +
-                     Time(time(nullptr)) + ")."
-               : "Let the provider give \"exp\" as a number of seconds.",
-         reply.said);
+    if (!known) {
+      return Fail("token-expired", "exp", seen,
+                  "Let the provider give \"exp\" as a number of seconds.", reply.said);
+    }
+    const Checkup::ServerTime* const server =
+        checkup.server_times.empty() ? nullptr : &checkup.server_times[0];
+    if (server == nullptr || expiry < server->theirs) {
+      return Fail("token-expired", "exp", "The token has expired: " + seen,
+                  "Pass a fresh token. If it is fresh, set this device's clock (" +
+                      Time(time(nullptr)) + ").",
+                  reply.said);
+    }
+    const long long ahead = static_cast<long long>(server->ours) - server->theirs;
+    Fail("token-expired", "exp",
+         "The token has expired for this device only, whose clock is " + Span(ahead) +
+             " ahead of that of " + server->server + ": " + seen,
+         "Set this device's clock, best with a time service (NTP): date -u; timedatectl",
+         reply.said, "clock-ahead");
   }
 
   bool ParseExpiry(long long& expiry) const {
@@ -228,15 +241,21 @@ class TokenCheck {
   void CheckName() {
     const Reply reply = checkup.library.UserName(token);
     const char* const claim = azure ? "unique_name, email" : "sub";
+    const std::string named = StringOf(claims, "unique_name");
+    if (azure && AddIfGuest(checkup, named.empty() ? StringOf(claims, "email") : named,
+                            {kStandardInput, claim}, reply.said)) {
+      return;
+    }
     if (reply.result.isString()) {
       user = reply.result.asString();
       return Good("token-name", claim, "The user is " + Quote(Shown(user, 100)));
     }
     if (reply.Threw("cannot find the user name!")) {
       return Fail("token-no-name", claim, "The token has no user name",
-                  azure ? "Add the optional claim \"email\" (v2.0 tokens) or \"unique_name\" (v1.0 "
-                          "tokens) at the provider."
-                        : "Let the provider give \"sub\" as a string.",
+                  azure
+                      ? "Add the optional claim \"email\" for ID tokens under App registrations > "
+                        "the application > Token configuration."
+                      : "Let the provider give \"sub\" as a string.",
                   reply.said);
     }
     if (reply.Threw("QOVAWinsUserNameFqdn2Netbios failed.")) {

@@ -1,5 +1,9 @@
 #include "doctor/token_endpoint.h"
 
+#include <algorithm>
+#include <array>
+
+#include "doctor/answer.h"
 #include "doctor/json.h"
 #include "doctor/redact.h"
 #include "doctor/text.h"
@@ -9,109 +13,196 @@ namespace doctor {
 
 namespace {
 
-// What is wrong with the answer to an empty request; an empty id if nothing is.
-Finding Fault(const WebAnswer& answer, const Json::Value& document, bool parsed) {
+// What a sound provider answers to a request with a false code, or without a secret.
+constexpr std::array kExpected = {"AADSTS9002313", "AADSTS900144", "AADSTS90014", "AADSTS70000",
+                                  "AADSTS70002",   "AADSTS70008",  "AADSTS54005", "AADSTS7000218",
+                                  "AADSTS7000216", "AADSTS50012",  "AADSTS50089", "CWWKS1406E",
+                                  "CWOAU0029E",    "CWOAU0033E",   "CWOAU0038E",  "CWOAU0058E"};
+
+bool IsExpected(const Refusal& refusal) {
+  return refusal.code.empty() || refusal.plain ||
+         std::find(kExpected.begin(), kExpected.end(), refusal.code) != kExpected.end();
+}
+
+std::string Fix(const Checkup& checkup) {
+  const std::string there = checkup.Documented("token_endpoint", checkup.settings.token_endpoint);
+  return "Set " + checkup.Key("token_endpoint") + " to " +
+         (there.empty() ? "the URL of the provider's token endpoint" : Shown(there, 200)) + ".";
+}
+
+// What is wrong with the answer; an empty id if nothing is.
+Finding Fault(const Checkup& checkup, const WebAnswer& answer, const Json::Value& document) {
   Finding finding{"", Grade::kFailure, ""};
-  const std::string set = "Set the URL to the provider's token endpoint";
-  if (IsRedirect(answer)) {
-    finding.id = "token-endpoint-redirect";
-    finding.cause = "The token endpoint redirects; the library does not follow";
-    finding.action = "Set the URL that the server redirects to, if it is the provider's.";
-  } else if (answer.status >= 500) {
-    finding.id = "token-endpoint-error";
-    finding.cause = "The token endpoint has an internal error";
-    finding.action = "Check the provider and its log.";
-  } else if (answer.status == 404 || answer.status == 405 || answer.status == 410) {
-    finding.id = "token-endpoint-wrong";
-    finding.cause = "The server has no token endpoint at this URL";
-    finding.action = set + ".";
-  } else if (!parsed) {
-    finding.id = "token-endpoint-no-json";
-    finding.cause = "The token endpoint does not answer in JSON";
-    finding.action = set + ", not to a page for people.";
-    if (answer.status == 400 || answer.status == 401) finding.grade = Grade::kWarning;
-  } else if (StringOf(document, "error").empty()) {
-    finding.id = "token-endpoint-odd";
-    finding.grade = Grade::kWarning;
-    finding.cause = "The token endpoint answers an empty request without an OAuth \"error\"";
-    finding.action = set + ", which refuses an empty request.";
+  const Refusal refusal = RefusalIn(answer.body);
+  const auto is = [&](const char* id, const std::string& cause, const std::string& action) {
+    finding.id = id;
+    finding.cause = cause + " (" + Describe(answer) + ")";
+    finding.action = action;
+    return finding;
+  };
+  if (!IsExpected(refusal)) {
+    is("token-endpoint-refuses", refusal.meaning, refusal.action);
+    finding.cause = refusal.meaning + " (" + refusal.code + ")";
+    return finding;
   }
-  finding.cause += " (" + Describe(answer) + ")";
+  if (IsRedirect(answer)) {
+    return is("token-endpoint-redirect",
+              "The token endpoint redirects; the library does not follow",
+              "Set the URL that the server redirects to, if it is the provider's.");
+  }
+  if (answer.status >= 500) {
+    return is("token-endpoint-error", "The token endpoint has an internal error",
+              "Check the provider and its log.");
+  }
+  if (answer.status == 404 || answer.status == 405 || answer.status == 410) {
+    return is("token-endpoint-wrong", "The server has no token endpoint at this URL", Fix(checkup));
+  }
+  if (!document.isObject()) {
+    if (answer.status == 400 || answer.status == 401) finding.grade = Grade::kWarning;
+    return is("token-endpoint-no-json", "The token endpoint does not answer in JSON", Fix(checkup));
+  }
+  if (StringOf(document, "error").empty()) {
+    finding.grade = Grade::kWarning;
+    return is("token-endpoint-odd",
+              "The token endpoint does not refuse a false code with \"error\"", Fix(checkup));
+  }
   return finding;
 }
 
-// Sends the client secret with a false code. The provider checks the client first.
-void TrySecret(Checkup& checkup, const Destination& endpoint) {
-  const std::string body = checkup.library.ExchangeBody();
-  WebAnswer answer;
-  if (!Exchange(checkup, endpoint, &body, answer)) return;
-  Json::Value document;
-  ParseJson(answer.body, document);
-  const std::string error = StringOf(document, "error");
-  const Place place = checkup.At("client_secret");
-  if (error == "invalid_grant") {
-    checkup.report.Good("secret-accepted",
-                        "The provider accepts client ID and secret, and refuses the false code: " +
-                            ErrorOf(document),
-                        place);
-  } else if (error == "invalid_client" || error == "unauthorized_client") {
-    checkup.report.Fail("secret-refused",
-                        "The provider refuses client ID or secret: " + ErrorOf(document), place,
-                        "Set client ID and client secret to the provider's values; a secret may "
-                        "have expired there.",
-                        checkup.library.TokenRequest(body).said);
-  } else {
-    checkup.report.Unchecked("secret-not-checked",
-                             "The provider does not report whether it accepts the secret: " +
-                                 Describe(answer) + (error.empty() ? "" : ", " + ErrorOf(document)),
-                             place, "Try a sign-in with a browser.");
+// --- the client secret
+
+// The body of a token request, without some of its parameters.
+std::string Without(const std::string& body, std::initializer_list<const char*> names) {
+  std::string rest;
+  for (size_t at = 0; at < body.size();) {
+    const size_t end = std::min(body.find('&', at), body.size());
+    const std::string parameter = body.substr(at, end - at);
+    const std::string name = parameter.substr(0, parameter.find('='));
+    if (std::find(names.begin(), names.end(), name) == names.end()) {
+      rest += (rest.empty() ? "" : "&") + parameter;
+    }
+    at = end + 1;
   }
+  return rest;
 }
+
+// The grant that no user takes part in: what it answers is about client and secret alone.
+std::string ClientCredentials(const Checkup& checkup, const std::string& exchange) {
+  const bool v2 = ShapeOf(checkup.settings.token_endpoint).version == 2;
+  return "grant_type=client_credentials&" +
+         Without(exchange, {"grant_type", "code", "redirect_uri"}) +
+         (v2 ? "&scope=" + checkup.settings.client_id + "%2F.default" : "");
+}
+
+// Why the secret must not be sent there; empty if it may.
+std::string Doubt(const Checkup& checkup) {
+  const std::string& url = checkup.settings.token_endpoint;
+  if (ParsedUrl(url).scheme() != "https") return "the URL is not https";
+  if (!checkup.Documented("token_endpoint", url).empty()) {
+    return "the discovery document has another token endpoint";
+  }
+  return "";
+}
+
+class SecretCheck {
+ public:
+  SecretCheck(Checkup& checked, const Destination& to)
+      : checkup(checked), endpoint(to), place(checked.At("client_secret")) {}
+
+  void Run() {
+    const std::string doubt = Doubt(checkup);
+    if (!doubt.empty()) {
+      return checkup.report.Unchecked("secret-not-checked", "The secret was not sent: " + doubt,
+                                      place, "Correct the token endpoint, and try again.");
+    }
+    const std::string exchange = checkup.library.ExchangeBody();
+    // Providers differ in the order of their checks: what the second request says is only used if
+    // it is about the client.
+    if (Try(ClientCredentials(checkup, exchange)) || Try(exchange)) return;
+    checkup.report.Unchecked(
+        "secret-not-checked",
+        "The provider does not report whether it accepts the secret: " + Describe(answer) +
+            (refusal.code.empty() ? "" : ", " + refusal.code) +
+            (StringOf(document, "error").empty() ? "" : ", " + ErrorOf(document)),
+        place, "Try a sign-in with a browser.");
+  }
+
+ private:
+  // True if the answer, or that there is none, is in the report.
+  bool Try(const std::string& body) {
+    if (!Exchange(checkup, endpoint, &body, answer)) return true;
+    document = Json::Value();
+    ParseJson(answer.body, document);
+    refusal = RefusalIn(answer.body);
+    const std::string token = StringOf(document, "access_token");
+    if (answer.status == 200 && !token.empty()) {
+      Hide(token);
+      checkup.report.Good("secret-accepted", "The provider accepts client ID and secret", place);
+      return true;
+    }
+    const std::string error = StringOf(document, "error");
+    const bool client =
+        error == "invalid_client" || (error == "unauthorized_client" && !refusal.plain);
+    if (!refusal.about_secret && (!client || (IsExpected(refusal) && !refusal.plain))) return false;
+    Refuse(body);
+    return true;
+  }
+
+  void Refuse(const std::string& body) {
+    const std::vector<Said> said = checkup.library.TokenRequest(body).said;
+    if (refusal.code.empty() || refusal.plain) {
+      checkup.report.Fail("secret-refused",
+                          "The provider refuses client ID or secret: " + ErrorOf(document), place,
+                          "Set client ID and client secret to the provider's values; a secret may "
+                          "have expired there.",
+                          said);
+    } else if (refusal.about_secret) {
+      checkup.report.Fail("secret-refused", refusal.meaning + " (" + refusal.code + ")", place,
+                          refusal.action, said);
+    } else {
+      checkup.report.Fail("client-refused", refusal.meaning + " (" + refusal.code + ")",
+                          checkup.At("client_id"), refusal.action, said);
+    }
+  }
+
+  Checkup& checkup;
+  const Destination& endpoint;
+  const Place place;
+  WebAnswer answer;
+  Json::Value document;
+  Refusal refusal;
+};
 
 }  // namespace
 
-bool IsRedirect(const WebAnswer& answer) {
-  return answer.status >= 300 && answer.status < 400;
-}
-
-std::string Describe(const WebAnswer& answer) {
-  std::string text = "HTTP " + std::to_string(answer.status);
-  if (!answer.type.empty()) text += ", " + Shown(answer.type, 60);
-  if (IsRedirect(answer) && !answer.location.empty()) text += ", to " + Shown(answer.location, 200);
-  return text;
-}
-
-std::string ErrorOf(const Json::Value& document) {
-  const std::string more = StringOf(document, "error_description");
-  return Quote(Shown(StringOf(document, "error"), 60)) +
-         (more.empty() ? "" : " (" + Shown(more, 200) + ")");
-}
-
 void CheckTokenEndpoint(Checkup& checkup) {
-  const Destination endpoint{"token endpoint", checkup.settings.token_endpoint, Grade::kFailure,
-                             [&checkup] { return checkup.library.TokenRequest("").said; }};
-  if (!checkup.IsWorthRequest(endpoint.url)) return;
-  const std::string nothing;
-  WebAnswer answer;
-  const bool answered = Exchange(checkup, endpoint, &nothing, answer);
-  if (answered) {
-    Json::Value document;
-    const bool parsed = ParseJson(answer.body, document) && document.isObject();
-    Finding fault = Fault(answer, document, parsed);
-    if (fault.id.empty()) {
-      checkup.report.Good("token-endpoint",
-                          "The token endpoint refuses an empty request: " + ErrorOf(document),
-                          At(endpoint, answer));
-    } else {
+  const std::string body = Without(checkup.library.ExchangeBody(), {"client_secret"});
+  Destination endpoint{"token endpoint", checkup.settings.token_endpoint, Grade::kFailure,
+                       [&] { return checkup.library.TokenRequest(body).said; }};
+  if (checkup.IsWorthRequest(endpoint.url)) {
+    if (!checkup.Documented("token_endpoint", endpoint.url).empty()) endpoint.fix = Fix(checkup);
+    WebAnswer answer;
+    if (Exchange(checkup, endpoint, &body, answer)) {
+      Json::Value document;
+      ParseJson(answer.body, document);
+      Finding fault = Fault(checkup, answer, document);
       fault.place = At(endpoint, answer);
-      fault.detail = endpoint.library();
-      checkup.report.Add(fault);
+      if (fault.id.empty()) {
+        checkup.report.Good("token-endpoint",
+                            "The token endpoint refuses a false code: " + ErrorOf(document),
+                            fault.place);
+      } else {
+        fault.detail = endpoint.library();
+        checkup.report.Add(fault);
+      }
     }
   }
   if (!checkup.options.try_secret) return;
   const std::string obstacle = checkup.report.Obstacle();
-  if (!obstacle.empty()) return checkup.report.Skip("The client secret", obstacle);
-  TrySecret(checkup, endpoint);
+  if (!obstacle.empty() || !checkup.IsWorthRequest(endpoint.url)) {
+    return checkup.report.Skip("The client secret", obstacle);
+  }
+  SecretCheck(checkup, endpoint).Run();
 }
 
 }  // namespace doctor

@@ -4,7 +4,9 @@
 
 #include <cstring>
 #include <ctime>
+#include <regex>
 
+#include "doctor/answer.h"
 #include "doctor/redact.h"
 #include "doctor/terminal.h"
 #include "doctor/text.h"
@@ -35,24 +37,24 @@ class TransferReport {
         detail(Shown(got.detail, 200)) {}
 
   bool Run() {
+    if (IsProxyFault()) return AddProxy();
     switch (answer.code) {
       case CURLE_OK:
-        AddGood();
-        return true;
+        return AddAnswer();
       case CURLE_URL_MALFORMAT:
       case CURLE_UNSUPPORTED_PROTOCOL:
-        Fail("url-unusable", "The URL cannot be used: " + detail, "Write a whole URL, https://...");
+        FailAt("url-unusable", "The URL cannot be used: " + detail,
+               "Write a whole URL, https://...");
         break;
       case CURLE_COULDNT_RESOLVE_HOST:
-      case CURLE_COULDNT_RESOLVE_PROXY:
-        Fail("name-not-resolved", "The host name cannot be resolved: " + detail,
-             "Correct the host name or the device's name servers (/etc/resolv.conf), until it has "
-             "an address: getent hosts " +
-                 host);
+        FailAt("name-not-resolved", "The host name cannot be resolved: " + detail,
+               "Correct the host name or the device's name servers (/etc/resolv.conf), until it "
+               "has an address: getent hosts " +
+                   host);
         break;
       case CURLE_COULDNT_CONNECT:
-        Fail("connect-failed", "The server cannot be reached: " + detail + Reason(),
-             "Check host and port in the URL, then routes, firewall and proxy of the device.");
+        FailAt("connect-failed", "The server cannot be reached: " + detail + Reason(),
+               "Check host and port in the URL, then routes, firewall and proxy of the device.");
         break;
       case CURLE_OPERATION_TIMEDOUT:
         AddSilent();
@@ -85,6 +87,11 @@ class TransferReport {
     Add(id, destination.grave, cause, action, destination.library());
   }
 
+  // Of a URL that may be wrong.
+  void FailAt(const char* id, const std::string& cause, const std::string& action) {
+    Fail(id, cause, destination.fix.empty() ? action : destination.fix);
+  }
+
   void Add(const char* id, Grade grade, const std::string& cause, const std::string& action,
            const std::vector<Said>& said) {
     checkup.report.Add({id, grade, cause, At(destination, answer), action, said});
@@ -92,6 +99,47 @@ class TransferReport {
 
   std::string Reason() const {
     return answer.os_error != 0 ? " (" + std::string(std::strerror(answer.os_error)) + ")" : "";
+  }
+
+  // --- proxy and network
+
+  bool IsProxyFault() const {
+    return answer.connect_status >= 400 || answer.code == CURLE_COULDNT_RESOLVE_PROXY ||
+           (answer.code == CURLE_COULDNT_CONNECT && !ProxyFor(destination.url).empty());
+  }
+
+  bool AddProxy() {
+    const ParsedUrl proxy(ProxyFor(destination.url));
+    const std::string who = "The proxy " + Shown(proxy.host() + ":" + proxy.port(), 100);
+    const long status = answer.connect_status;
+    if (status == 0) {
+      Fail("proxy-failed", who + " cannot be reached: " + detail + Reason(),
+           "Correct the proxy in the environment (https_proxy), or remove it.");
+    } else if (status == 407) {
+      Fail("proxy-failed", who + " asks for a user name and password (HTTP 407)",
+           "Put user name and password of the proxy into https_proxy, or let it admit the device.");
+    } else if (status >= 500) {
+      Fail("proxy-failed",
+           who + " does not reach " + host + " (HTTP " + std::to_string(status) + ")",
+           "Check that the proxy can resolve and reach " + host + ".");
+    } else {
+      Fail("proxy-failed",
+           who + " refuses connections to " + host + " (HTTP " + std::to_string(status) + ")",
+           "Allow " + host + " at the proxy.");
+    }
+    return false;
+  }
+
+  bool AddAnswer() {
+    Finding stranger;
+    if (!destination.page || answer.status >= 400) stranger = Stranger(answer, destination.url);
+    if (stranger.id.empty()) {
+      AddGood();
+      return true;
+    }
+    Add(stranger.id.c_str(), destination.grave, stranger.cause, stranger.action,
+        destination.library());
+    return false;
   }
 
   // The library is not asked: it would wait.
@@ -111,11 +159,11 @@ class TransferReport {
   void AddRefusedCertificate() {
     const std::vector<Certificate>& chain = answer.certificates;
     if (answer.verify_error == X509_V_OK) {
-      return Fail("tls-wrong-name",
-                  "The certificate is not for " + Quote(host) + ": " +
-                      (chain.empty() ? detail : Describe(chain[0])),
-                  "Use a host name of the certificate, or get the provider a certificate for " +
-                      Quote(host) + ".");
+      return FailAt("tls-wrong-name",
+                    "The certificate is not for " + Quote(host) + ": " +
+                        (chain.empty() ? detail : Describe(chain[0])),
+                    "Use a host name of the certificate, or get the provider a certificate for " +
+                        Quote(host) + ".");
     }
     const Certificate* const about =
         answer.verify_depth < chain.size() ? &chain[answer.verify_depth] : nullptr;
@@ -129,6 +177,30 @@ class TransferReport {
       return Fail("tls-not-yet-valid",
                   "A certificate is valid only from " + Time(about->not_before) + ": " + which,
                   "Set this device's clock (" + Time(time(nullptr)) + "), or wait.");
+    }
+    AddUntrusted(which);
+  }
+
+  // A firewall or proxy that opens TLS connections signs with its own authority.
+  void AddUntrusted(const std::string& which) {
+    static const std::regex inspects(
+        "prox(y|ies)|inspect|intercept|firewall|gateway|appliance|filter|mitm|forti|zscaler|"
+        "netskope|sophos|blue ?coat|palo alto|checkpoint|umbrella|decrypt",
+        std::regex::icase);
+    static const std::regex microsoft(
+        "(.*\\.)?(microsoftonline\\.(com|us)|windows\\.net|"
+        "microsoftonline\\.cn)");
+    static const std::regex theirs("DigiCert|Microsoft");
+    const std::string issuer = answer.certificates.empty() ? "" : answer.certificates.back().issuer;
+    const std::string shown = Shown(issuer, 200);
+    if (std::regex_search(issuer, inspects) ||
+        (std::regex_match(host, microsoft) && !std::regex_search(issuer, theirs))) {
+      return Fail("tls-intercepted",
+                  "The certificate is not the provider's: a firewall or proxy between opens the "
+                  "connection and signs as " +
+                      shown,
+                  "Exempt " + host + " from TLS inspection, or add the certificate of " + shown +
+                      " to " + TrustStore() + ".");
     }
     const bool gap = answer.verify_error == X509_V_ERR_UNABLE_TO_GET_ISSUER_CERT_LOCALLY ||
                      answer.verify_error == X509_V_ERR_UNABLE_TO_VERIFY_LEAF_SIGNATURE;
@@ -171,13 +243,24 @@ Place At(const Destination& destination, const WebAnswer& answer) {
   return {"", "", Shown(destination.url, 200), answer.address};
 }
 
-bool Exchange(Checkup& checkup, const Destination& destination, const std::string* body,
-              WebAnswer& answer) {
+WebAnswer Send(Checkup& checkup, const Destination& destination, const std::string* body,
+               const std::string& url) {
   Progress("Waiting for the " + destination.what + ", " + destination.url);
-  answer = Fetch(destination.url, body, checkup.options.timeout);
+  WebAnswer answer = Fetch(url.empty() ? destination.url : url, body, checkup.options.timeout);
+  checkup.transfer_milliseconds += answer.milliseconds;
   checkup.report.AddRequest({destination.what, body == nullptr ? "GET" : "POST", destination.url,
                              answer.address, answer.status, answer.milliseconds});
+  return answer;
+}
+
+bool Judge(Checkup& checkup, const Destination& destination, const WebAnswer& answer) {
   return TransferReport(checkup, destination, answer).Run();
+}
+
+bool Exchange(Checkup& checkup, const Destination& destination, const std::string* body,
+              WebAnswer& answer, const std::string& url) {
+  answer = Send(checkup, destination, body, url);
+  return Judge(checkup, destination, answer);
 }
 
 }  // namespace doctor

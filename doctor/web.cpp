@@ -3,8 +3,14 @@
 #include <openssl/ssl.h>
 #include <openssl/x509v3.h>
 
+#include <algorithm>
+#include <chrono>
+#include <cstdlib>
 #include <memory>
 #include <new>
+
+#include "doctor/text.h"
+#include "doctor/url.h"
 
 namespace doctor {
 
@@ -64,23 +70,36 @@ Certificate Describe(const X509* certificate) {
           TimeOf(X509_get0_notAfter(certificate))};
 }
 
+// What the callbacks of a transfer need.
+struct Transfer {
+  WebAnswer answer;
+  std::string host;
+  bool lenient;
+};
+
 // Verifies as OpenSSL does, and keeps what it saw.
 int VerifyAndKeep(X509_STORE_CTX* context, void* user) {
-  WebAnswer& answer = *static_cast<WebAnswer*>(user);
+  const Transfer& transfer = *static_cast<Transfer*>(user);
+  WebAnswer& answer = static_cast<Transfer*>(user)->answer;
   const int result = X509_verify_cert(context);
   answer.verify_error = X509_STORE_CTX_get_error(context);
   answer.verify_text = X509_verify_cert_error_string(answer.verify_error);
   const int depth = X509_STORE_CTX_get_error_depth(context);
   answer.verify_depth = depth > 0 ? static_cast<size_t>(depth) : 0;
   answer.certificates.clear();
-  if (const X509* const own = X509_STORE_CTX_get0_cert(context)) {
+  if (X509* const own = X509_STORE_CTX_get0_cert(context)) {
     answer.certificates.push_back(Describe(own));
+    const std::string& host = transfer.host;
+    answer.names_host = X509_check_host(own, host.data(), host.size(), 0, nullptr) == 1 ||
+                        X509_check_ip_asc(own, host.c_str(), 0) == 1;
   }
   const STACK_OF(X509)* const sent = X509_STORE_CTX_get0_untrusted(context);
   for (int i = 1; sent != nullptr && i < sk_X509_num(sent); ++i) {
     answer.certificates.push_back(Describe(sk_X509_value(sent, i)));
   }
-  return result;
+  if (!transfer.lenient) return result;
+  X509_STORE_CTX_set_error(context, X509_V_OK);
+  return 1;
 }
 
 CURLcode SetUpTls(CURL*, void* context, void* user) {
@@ -98,14 +117,19 @@ size_t KeepBody(char* data, size_t size, size_t count, void* user) {
   return size * count;
 }
 
-// Keeps the server's time of the header.
+// Keeps what the header says about the server's time and about who answers.
 size_t KeepHeader(char* data, size_t size, size_t count, void* user) {
   WebAnswer& answer = *static_cast<WebAnswer*>(user);
   try {
     const std::string line(data, size * count);
-    if (line.size() > 5 && curl_strnequal(line.c_str(), "date:", 5)) {
+    const std::string name = LowerCase(line.substr(0, line.find(':')));
+    if (name == "date") {
       const time_t date = curl_getdate(line.c_str() + 5, nullptr);
       answer.date = date > 0 ? date : 0;
+    } else if (name == "www-authenticate") {
+      answer.asks_login = true;
+    } else if (name == "via" || name == "server" || name.compare(0, 8, "x-squid-") == 0) {
+      answer.via += line.substr(0, line.find_first_of("\r\n")) + " ";
     }
   } catch (const std::bad_alloc&) {
     return 0;
@@ -128,6 +152,7 @@ void Inspect(CURL* handle, WebAnswer& answer) {
   curl_easy_getinfo(handle, CURLINFO_OS_ERRNO, &os_error);
   answer.os_error = static_cast<int>(os_error);
   curl_easy_getinfo(handle, CURLINFO_RESPONSE_CODE, &answer.status);
+  curl_easy_getinfo(handle, CURLINFO_HTTP_CONNECTCODE, &answer.connect_status);
   answer.address = Text(handle, CURLINFO_PRIMARY_IP);
   curl_off_t microseconds = 0;
   curl_easy_getinfo(handle, CURLINFO_TOTAL_TIME_T, &microseconds);
@@ -139,13 +164,14 @@ void Inspect(CURL* handle, WebAnswer& answer) {
 
 }  // namespace
 
-WebAnswer Fetch(const std::string& url, const std::string* body, int seconds) {
+WebAnswer Fetch(const std::string& url, const std::string* body, int seconds, bool lenient) {
   const CurlState state;
   const Handle owner(curl_easy_init());
   CURL* const handle = owner.get();
   if (handle == nullptr) throw std::bad_alloc();
 
-  WebAnswer answer;
+  Transfer transfer{{}, ParsedUrl(url).host(), lenient};
+  WebAnswer& answer = transfer.answer;
   char error[CURL_ERROR_SIZE] = {};
   curl_easy_setopt(handle, CURLOPT_URL, url.c_str());
   if (body != nullptr) curl_easy_setopt(handle, CURLOPT_POSTFIELDS, body->c_str());
@@ -158,13 +184,59 @@ WebAnswer Fetch(const std::string& url, const std::string* body, int seconds) {
   curl_easy_setopt(handle, CURLOPT_NOSIGNAL, 1L);
   // Without effect on a libcurl that is not built with OpenSSL: then the certificates stay unseen.
   curl_easy_setopt(handle, CURLOPT_SSL_CTX_FUNCTION, SetUpTls);
-  curl_easy_setopt(handle, CURLOPT_SSL_CTX_DATA, &answer);
+  curl_easy_setopt(handle, CURLOPT_SSL_CTX_DATA, &transfer);
+  curl_easy_setopt(handle, CURLOPT_SUPPRESS_CONNECT_HEADERS, 1L);
+  if (lenient) {  // the device itself
+    curl_easy_setopt(handle, CURLOPT_SSL_VERIFYHOST, 0L);
+    curl_easy_setopt(handle, CURLOPT_PROXY, "");
+  }
 
   answer.code = curl_easy_perform(handle);
   answer.received = time(nullptr);
   answer.detail = error[0] != '\0' ? error : curl_easy_strerror(answer.code);
   Inspect(handle, answer);
   return answer;
+}
+
+std::string ProxyFor(const std::string& url) {
+  const ParsedUrl parsed(url);
+  const auto value = [](const char* name) {
+    const char* const text = std::getenv(name);
+    return std::string(text != nullptr ? text : "");
+  };
+  std::string except = value("no_proxy") + value("NO_PROXY");
+  for (size_t at = 0; at < except.size();) {
+    const size_t end = std::min(except.find_first_of(", ", at), except.size());
+    std::string name = LowerCase(except.substr(at, end - at));
+    at = end + 1;
+    if (name == "*") return "";
+    if (!name.empty() && name[0] == '.') name.erase(0, 1);
+    if (!name.empty() && (parsed.host() == name || EndsWith(parsed.host(), "." + name))) return "";
+  }
+  const bool plain = parsed.scheme() == "http";  // HTTP_PROXY would come from a CGI request
+  for (const char* name : {plain ? "http_proxy" : "https_proxy", plain ? "" : "HTTPS_PROXY",
+                           "all_proxy", "ALL_PROXY"}) {
+    if (*name != '\0' && !value(name).empty()) return value(name);
+  }
+  return "";
+}
+
+long BundleMilliseconds() {
+  const std::string bundle = TrustStore().substr(0, TrustStore().find(", "));
+  long least = 0;
+  for (int i = 0; i < 3; ++i) {  // the first time is longer
+    const std::unique_ptr<SSL_CTX, Deleter<SSL_CTX_free>> context(SSL_CTX_new(TLS_client_method()));
+    const auto start = std::chrono::steady_clock::now();
+    if (context == nullptr ||
+        SSL_CTX_load_verify_locations(context.get(), bundle.c_str(), nullptr) != 1) {
+      return 0;
+    }
+    const std::chrono::duration<double, std::milli> taken =
+        std::chrono::steady_clock::now() - start;
+    const long milliseconds = static_cast<long>(taken.count());
+    least = i == 0 ? milliseconds : std::min(least, milliseconds);
+  }
+  return least;
 }
 
 std::string TrustStore() {

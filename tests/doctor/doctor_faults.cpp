@@ -381,14 +381,18 @@ std::vector<SeededFault> networkFaults() {
   };
   return {
       {"NameUnknown",
-       [](Site& s) { s.settings["azure_token_endpoint"] = "https://login.invalid/token"; },
+       [](Site& s) {
+         s.settings["azure_token_endpoint"] = "https://login.invalid/token";
+         s.discovery.removeMember("token_endpoint");
+       },
        "name-not-resolved", "failure", "request token uri Couldn't resolve host name.",
        "getent hosts login.invalid", 1, Proof::kSameWords},
       {"NobodyListens", connectElsewhere, "connect-failed", "failure",
        "request token uri Couldn't connect to server.", "host and port", 1, Proof::kSameWords},
       {"ProxyOfTheEnvironment",
-       [](Site& s) { s.environment["https_proxy"] = "http://localhost:1"; }, "connect-failed",
-       "failure", "request token uri Couldn't connect to server.", "proxy", 1, Proof::kNone},
+       [](Site& s) { s.environment["https_proxy"] = "http://localhost:1"; }, "proxy-failed",
+       "failure", "request token uri Couldn't connect to server.", "Correct the proxy", 1,
+       Proof::kNone},
       {"AuthorityUnknown", [](Site& s) { s.trusted = false; }, "tls-untrusted", "failure", kRefused,
        store, 1, Proof::kSameWords},
       {"SelfSigned", [](Site& s) { s.identity = selfSigned({"localhost"}); }, "tls-untrusted",
@@ -509,7 +513,8 @@ std::vector<SeededFault> answerFaults() {
        false},
       {"DiscoveryDiffers",
        [](Site& s) { s.discovery["token_endpoint"] = "https://localhost/other"; },
-       "discovery-differs", "warning", "", "Set azure_token_endpoint", 0, Proof::kSucceeds},
+       "discovery-differs", "warning", "", "If sign-ins fail, set azure_token_endpoint", 0,
+       Proof::kSucceeds},
       {"DiscoveryOfAnotherTenant",
        [](Site& s) {
          const std::string other = "99999999-6f0a-4d7e-9b1e-5a2c7d8e9f00";
@@ -576,11 +581,11 @@ std::vector<SeededFault> answerFaults() {
       {"TokenEndpointWrong", answer("/token", failed(404, page)), "token-endpoint-wrong", "failure",
        kParseFailed, "token endpoint", 1, Proof::kSameWords},
       {"TokenEndpointIsAPage", answer("/token", ok(page)), "token-endpoint-no-json", "failure",
-       kParseFailed, "not to a page for people", 1, Proof::kSameWords},
+       kParseFailed, "Set azure_token_endpoint", 1, Proof::kSameWords},
       {"TokenEndpointRefusesInHtml", probe(failed(400, page)), "token-endpoint-no-json", "warning",
-       kParseFailed, "not to a page for people", 0, Proof::kSucceeds},
+       kParseFailed, "Set azure_token_endpoint", 0, Proof::kSucceeds},
       {"TokenEndpointOdd", probe(ok("{}")), "token-endpoint-odd", "warning",
-       "we cannot find key 'id_token' in response!", "refuses an empty request", 0,
+       "we cannot find key 'id_token' in response!", "Set azure_token_endpoint", 0,
        Proof::kSucceeds},
       {"SecretRefused",
        [](Site& s) {
@@ -772,9 +777,9 @@ std::vector<SeededFault> webSphereTokenFaults() {
 
 std::vector<SeededFault> allFaults() {
   std::vector<SeededFault> all;
-  for (const auto& group :
-       {profileFaults(), settingsFileFaults(), valueFaults(), identityFaults(), networkFaults(),
-        answerFaults(), clockFaults(), nameFaults(), azureTokenFaults(), webSphereTokenFaults()}) {
+  for (const auto& group : {profileFaults(), settingsFileFaults(), valueFaults(), identityFaults(),
+                            networkFaults(), wayFaults(), answerFaults(), clockFaults(),
+                            nameFaults(), azureTokenFaults(), webSphereTokenFaults()}) {
     all.insert(all.end(), group.begin(), group.end());
   }
   return all;

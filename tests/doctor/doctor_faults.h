@@ -37,5 +37,6 @@ inline std::ostream& operator<<(std::ostream& out, const SeededFault& fault) {
 }
 
 std::vector<SeededFault> allFaults();
+std::vector<SeededFault> wayFaults();  // between device and provider; network_faults.cpp
 
 }  // namespace test

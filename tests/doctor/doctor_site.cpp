@@ -121,10 +121,12 @@ Site::Site(bool forAzure) : azure(forAzure) {
   if (azure) claims["tid"] = kTenant;
   if (azure) claims["email"] = "alice@ad.werk.example.net";
   claims["sub"] = "alice";
+
+  loginProgram = failed(302, "login program");
+  loginProgram.headers = {"Location: /webman/ssoclient/relay.html#success=false"};
 }
 
 std::string Site::resolved(std::string text) const {
-  const std::string address = server->url("", host);
   for (std::size_t at; (at = text.find(kProvider)) != std::string::npos;) {
     text.replace(at, sizeof kProvider - 1, address);
   }
@@ -159,13 +161,17 @@ void Site::deploy(bool forLogin) {
   if (trusted && !trustedNow) ca.trust();
   trustedNow = true;
   server.reset();
+  Answer page = ok("<!DOCTYPE html><title>Sign in</title><form><input type=password></form>");
+  page.headers = {"Content-Type: text/html; charset=utf-8"};
   server = tls ? std::make_unique<Provider>(identity.value_or(ca.issue({"localhost"})))
                : std::make_unique<Provider>();
+  address = server->url("", host);
   Json::Value given(Json::objectValue);
   given["id_token"] = idToken();
   std::map<std::string, Answer> script = {
       {"/.well-known/openid-configuration", json(discovery)},
       {"/keys", json(keys)},
+      {"/authorize", page},
       {"/token", forLogin ? json(given) : failed(400, R"({"error":"invalid_request"})")}};
   for (const auto& [path, answer] : answers) script[path] = answer;
   if (!forLogin) {
@@ -175,8 +181,27 @@ void Site::deploy(bool forLogin) {
     answer.headers.push_back(httpDate(clockSkew));
     server->answer(path, answer);
   }
+  if (secretAnswer && !forLogin) server->answer("/token", *secretAnswer);
   server->start();
+  startDevice();
   writeFiles();
+}
+
+void Site::deployAt(const std::string& url) {
+  if (trusted && !trustedNow) ca.trust();
+  trustedNow = true;
+  address = url;
+  startDevice();
+  writeFiles();
+}
+
+// Its certificate is of an authority that the device need not know.
+void Site::startDevice() {
+  if (device != nullptr || deviceNames.empty()) return;
+  resolveToLoopback("device.example.net");
+  device = std::make_unique<Provider>(Ca().issue(deviceNames), 443);
+  device->answer("/webman/login.cgi", loginProgram);
+  device->start();
 }
 
 std::vector<Json::Value> Outcome::findings(const std::string& id) const {
@@ -257,14 +282,14 @@ Outcome runDoctor(const Site& site, bool text) {
   return run;
 }
 
-Login logIn(Ids ids) {
-  const std::string answer = asProcess(ids, ids, [] {
+Login logIn(Ids ids, const std::string& code) {
+  const std::string answer = asProcess(ids, ids, [&code] {
     const Log log;
     Json::Value result(Json::objectValue);
     std::string user;
     try {
       QOVA::SSO::SSOProfile profile;
-      QOVA::SSO::OIDCLogin("code", user);
+      QOVA::SSO::OIDCLogin(code, user);
     } catch (const std::exception& e) {
       int status = 0;
       char* const name = abi::__cxa_demangle(typeid(e).name(), nullptr, nullptr, &status);

@@ -42,11 +42,13 @@ class Site {
   uid_t settingsOwner = 0;
   gid_t profileGroup = 0;
 
-  // The provider. `answers` go for the paths of its documents; `probeAnswers` for the doctor alone.
+  // The provider. `answers` go for the paths of its documents; `probeAnswers` for the doctor alone,
+  // and `secretAnswer` for its second request to the token endpoint, with the secret.
   Json::Value discovery;
   Json::Value keys;
   std::map<std::string, Answer> answers;
   std::map<std::string, Answer> probeAnswers;
+  std::optional<Answer> secretAnswer;
   std::string host = "localhost";
   std::optional<Identity> identity;  // empty: one of the trusted authority
   bool tls = true;
@@ -67,9 +69,15 @@ class Site {
   unsigned short columns = 0;  // of a terminal for its output; 0: none
   bool withDirectory = false;  // the library with the platform of support/platform_directory.c
 
+  // The device's own web server, at the redirect URI.
+  Answer loginProgram;
+  std::vector<std::string> deviceNames = {"device.example.net"};  // of its certificate; none: down
+
   // Writes the files and starts the provider. For a login it gives out the token; for the doctor
   // it refuses the empty request.
   void deploy(bool forLogin);
+  // The same with a provider that runs already, at this URL.
+  void deployAt(const std::string& url);
   Provider& provider() { return *server; }
   const Ca& authority() const { return ca; }
   std::string idToken() const;
@@ -78,10 +86,13 @@ class Site {
   std::string resolved(std::string text) const;
   Answer json(const Json::Value& value) const;
   void writeFiles();
+  void startDevice();
 
   Ca ca;
   bool trustedNow = false;
+  std::string address;  // what kProvider stands for
   std::unique_ptr<Provider> server;
+  std::unique_ptr<Provider> device;
 };
 
 std::string compact(const Json::Value& value);
@@ -106,6 +117,6 @@ struct Login {
   std::string type;               // the exception's class
   std::vector<std::string> logs;  // without "unit:line "
 };
-Login logIn(Ids ids);
+Login logIn(Ids ids, const std::string& code = "code");
 
 }  // namespace test

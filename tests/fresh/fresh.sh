@@ -11,8 +11,8 @@ make_fresh_base() {
     die "needs debootstrap"
   rm -rf "$fresh_base"
   mkdir -p "$fresh_base"
-  mirror=$(cat /etc/apt/sources.list /etc/apt/sources.list.d/*.sources 2>/dev/null |
-    sed -nE 's/^URIs: *([^ ]+).*/\1/p; s/^deb +(\[[^]]*\] *)?([^ ]+).*/\2/p' | head -n 1)
+  mirror=$(sed -nE 's/^URIs: *([^ ]+).*/\1/p; s/^deb +(\[[^]]*\] *)?([^ ]+).*/\2/p' \
+    /etc/apt/sources.list /etc/apt/sources.list.d/*.sources 2>/dev/null | head -n 1) || true
   say "a fresh $suite: about 100 MB to download, 400 MB on disk, 2 minutes"
   quietly "debootstrap of $suite" \
     debootstrap --merged-usr --variant=minbase "$suite" "$fresh_base" $mirror ||
