@@ -12,10 +12,10 @@ import time
 from place import HOSTS, PROVIDER, TENANT, Portal
 from providers.web import Answer, page, redirect
 from row import EITHER, WARNING, Fault, twin
+from stage import BUNDLE
 
 BLOCKED = """<html><head><title>Web Filter</title></head><body><h1>Access blocked</h1>
 <p>Category: cloud login. Contact your network administrator.</p></body></html>"""
-BUNDLE = "/etc/ssl/certs/ca-certificates.crt"
 ELSEWHERE = "127.0.0.5"
 DAY = 86400
 

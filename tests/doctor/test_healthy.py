@@ -90,6 +90,8 @@ HEALTHY = [
      ("--try-secret",)),
     ("host in capital letters", "v1", everywhere("login.example.net", "LOGIN.example.net"), ()),
     ("port 443 in the URLs", "v1", everywhere("login.example.net", "login.example.net:443"), ()),
+    ("discovery document of v2.0, endpoints of v1.0", "v1", put(
+        wellknown=lambda url: url.replace("/.well", "/v2.0/.well")), ()),
     ("escaped slashes", "v1", replace("/", "\\/"), ()),
     ("login program behind a link", "v1", program_behind_a_link, ()),
     ("a token over several lines", "v1", lambda place: setattr(
