@@ -223,6 +223,7 @@ TEST(DoctorPage, HoldsEveryFinding) {
                         "token-name",
                         "token-accepted",
                         "ssoclient-doctor",
+                        "www-data",
                         "authorization-endpoint",
                         "date",
                         "www-authenticate",
@@ -240,11 +241,14 @@ TEST(DoctorPage, HoldsEveryFinding) {
 
 TEST(DoctorPage, HoldsNoFindingThatIsNotSeeded) {
   Texts seeded;
-  for (const char* name : {"doctor_faults.cpp", "network_faults.cpp", "doctor_twin_test.cpp"}) {
-    seeded.merge(Literals(contents(kRoot / "tests/doctor" / name)).found);
+  for (const auto& entry : fs::directory_iterator(kRoot / "tests/doctor")) {
+    const std::string name = entry.path().filename();
+    if (name.find("_faults.cpp") != std::string::npos) {
+      seeded.merge(Literals(contents(entry.path())).found);
+    }
   }
   for (const std::string& id : documentedFindings()) {
-    EXPECT_EQ(seeded.count(id), 1u) << id << " is not seeded in tests/doctor";
+    EXPECT_EQ(seeded.count(id), 1u) << id << " is not seeded in tests/doctor/*_faults.cpp";
   }
 }
 
