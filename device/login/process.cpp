@@ -2,6 +2,7 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <poll.h>
 #include <signal.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
@@ -33,15 +34,19 @@ constexpr rlim_t kChildFile = 1 << 20;
 volatile sig_atomic_t answered = 0;
 char reference[9] = "22222222";  // made early: a signal handler cannot
 
-// A line to the system log, without syslog(): that waits as long as the log's socket is full.
-void LogWithoutWaiting(const char* name, const char* text) {
+// A line to the system log, without syslog(): that waits as long as the log's socket is full. This
+// waits half a second at most.
+void LogQuickly(const char* name, const char* text) {
   char line[256];
   const int size = std::snprintf(line, sizeof line, "<11>login.cgi: sign-in failed [%s]: %s: %s",
                                  reference, name, text);
   const int log = socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
   sockaddr_un address{AF_UNIX, "/dev/log"};
   if (connect(log, reinterpret_cast<sockaddr*>(&address), sizeof address) == 0) {
-    (void)!send(log, line, static_cast<size_t>(size), MSG_NOSIGNAL);
+    pollfd room{log, POLLOUT, 0};
+    for (int i = 0; i < 5 && send(log, line, static_cast<size_t>(size), MSG_NOSIGNAL) < 0; ++i) {
+      poll(&room, 1, 100);
+    }
   }
 }
 
@@ -67,7 +72,7 @@ void CloseOneByOne() {
   }
 }
 
-// Descriptors 0 to 2 are open, all others closed: what the program opens gets a number of its own.
+// Descriptors 0 to 2 are open, all others closed: no file of the program gets a standard number.
 void ResetDescriptors() {
   int file = open("/dev/null", O_RDWR);
   while (file >= 0 && file <= STDERR_FILENO) file = open("/dev/null", O_RDWR);
@@ -133,7 +138,7 @@ void EndNow(const char* name, const char* text) {
                                    name, reference);
     (void)!write(STDOUT_FILENO, page, static_cast<size_t>(size));
   }
-  LogWithoutWaiting(name, text);
+  LogQuickly(name, text);
   _exit(1);
 }
 

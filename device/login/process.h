@@ -22,8 +22,8 @@ void SetDeadline(int seconds);
 // Answered says that the program is about to write its answer: the deadline writes no other.
 void Answered();
 
-// EndNow ends the program at once, with a failure for the browser and a line in the log, neither
-// of which waits for anybody. `name` is the failure's, for instance "timeout".
+// EndNow ends the program at once, with a failure for the browser and a line in the log. It
+// does not wait for a log that nobody reads. `name` is the failure's, for instance "timeout".
 [[noreturn]] void EndNow(const char* name, const char* text);
 
 // Confine gives a child process its limits of memory, processor time and file size, and lets it end
@@ -33,8 +33,8 @@ void Confine(pid_t parent, int seconds);
 // DieWithParent is the last part of Confine. Each change of ids undoes it.
 void DieWithParent(pid_t parent);
 
-// SetProxy tells libcurl of the proxy in the settings: there is no other way from outside the
-// library than the process's own environment.
+// SetProxy passes the proxy of the settings to libcurl. Its only way in from outside the library is
+// the environment, which holds nothing else by then.
 void SetProxy(const Settings& settings);
 
 }  // namespace process

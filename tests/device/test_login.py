@@ -480,7 +480,7 @@ class SetUp(DeviceTest):
                                         f"{path}: {profile}_{key} is missing or no URL")
 
     def test_line_break_in_the_endpoint(self):
-        """It does not begin a header of its own."""
+        """It does not begin another header."""
         self.change("websphere", authorization_endpoint=self.device.provider.url + "/a\nSet-Cookie: a=b\n\n")
         out = self.run_program("action=start")
         self.assertIn("#reason=internal.", out)

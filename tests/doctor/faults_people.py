@@ -5,9 +5,9 @@ import os
 import shutil
 import time
 
-from place import (CALLBACK, CLIENT, HELPER, LOGIN, OTHER_TENANT, QOVA, RELAY, SECRET, TENANT, WWW)
+from place import CLIENT, HELPER, LOGIN, OTHER_TENANT, QOVA, RELAY, SETTINGS, TENANT, WWW
 from providers.jose import base64url, token
-from row import EITHER, WARNING, Fault, all_of, put, twin
+from row import EITHER, Fault, all_of, put, twin
 from stage import run, write
 
 # -- the login program ---------------------------------------------------------------------
@@ -104,14 +104,24 @@ def launcher_alone(place):
     place.stage.install_login(build + "/demo/device/launcher.cgi", LOGIN, 0o4750)
 
 
-def no_store(place):
-    os.rename("/run/ssoclient", "/run/ssoclient.away")
-    place.later(lambda: os.rename("/run/ssoclient.away", "/run/ssoclient"))
+STORE_FOLDER = "/run/ssoclient"
 
 
-def store_of_root(place):
-    os.chown("/run/ssoclient", 0, 0)
-    place.later(lambda: os.chown("/run/ssoclient", 33, 33))
+def old_store(place):
+    """As an older login program had it."""
+    os.makedirs(STORE_FOLDER, exist_ok=True)
+    os.chown(STORE_FOLDER, 33, 33)
+    place.later(lambda: os.chown(STORE_FOLDER, 0, 33))
+
+
+def store_is_a_file(place):
+    shutil.rmtree(STORE_FOLDER, ignore_errors=True)
+    write(STORE_FOLDER, "")
+    place.later(lambda: os.unlink(STORE_FOLDER))
+
+
+def open_login_conf(place):
+    write(f"{SETTINGS}/login.conf", "deadline = 20\n", 0o666)
 
 
 def writable_parent(place):
@@ -136,7 +146,8 @@ def with_claims(**claims):
         entra = place.twin
         key = entra._signing_keys()[0]
         now = int(time.time())
-        value = {"aud": CLIENT, "tid": TENANT, "exp": now + 3600, "iss": f"https://sts.windows.net/{TENANT}/",
+        value = {"aud": CLIENT, "tid": TENANT, "exp": now + 3600,
+                 "iss": f"https://sts.windows.net/{TENANT}/",
                  "unique_name": "alice@ad.example.net", **claims}
         value = {name: one for name, one in value.items() if one is not None}
         header = {"alg": "RS256", "kid": key.thumbprint}
@@ -182,7 +193,6 @@ def message(value):
     return do
 
 
-RUN = "failed: does not start|failed: "
 FINE = "signed in"
 
 PROGRAM = [
@@ -190,16 +200,18 @@ PROGRAM = [
           ("set-id|set-user-id|setuid|root",), at=("login.cgi",), do=("chmod|4750|u\\+s",)),
     Fault("set-id bit lost by chown", owner(0, 33, 0o755), "client_id=&",
           ("set-id|set-user-id|setuid|root",), at=("login.cgi",), do=("chmod",)),
-    Fault("login program is the web server's", owner(33, 33, 0o4750), "client_id=&",
-          ("own|root",), at=("login.cgi",), do=("chown",)),
+    Fault("login program is the web server's", owner(33, 33, 0o4750), "client_id=&", ("own|root",),
+          at=("login.cgi",), do=("chown",)),
     Fault("login program not executable for the web server", mode(0o4700), "does not start",
-          ("start|execut|run|permission",), at=("login.cgi",), do=("chmod|chgrp|chown|permission",)),
+          ("start|execut|run|permission",), at=("login.cgi",),
+          do=("chmod|chgrp|chown|permission",)),
     Fault("login program of another group", owner(0, 0, 0o4750), "does not start",
           ("start|execut|run|permission",), at=("login.cgi",), do=("chmod|chgrp|chown|group",)),
     Fault("login program without x", mode(0o4640), "does not start",
           ("start|execut|run|permission",), at=("login.cgi",), do=("chmod",)),
     Fault("login program below a closed folder", closed_parent, "does not start",
-          ("folder|directory|start|execut|run|permission",), at=("webman",), do=("chmod|permission|open",)),
+          ("folder|directory|start|execut|run|permission",), at=("webman",),
+          do=("chmod|permission|open",)),
     Fault("file system with nosuid", nosuid, "client_id=&", ("nosuid",), at=("login.cgi|webman",),
           do=("mount|nosuid",)),
     Fault("login program for another processor", rewritten(other_machine), "does not start",
@@ -216,48 +228,49 @@ PROGRAM = [
           ("missing|does not exist|not found|no such",), at=("login.cgi",)),
     Fault("library is not in the loader's folders", no_library, "^$|^\nlog|log: $",
           ("librar|libssoclient",), at=("libssoclient|login.cgi",), do=("ldconfig|ld.so|library",)),
-    Fault("login program writable by others", mode(0o4777), FINE,
-          ("writ|replace|change",), at=("login.cgi",), do=("chmod",), grade=EITHER),
-    Fault("library folder is the web server's", writable_library, FINE,
-          ("librar|folder|writ",), at=("/usr/qova/lib",), do=("chown|chmod",), grade=EITHER),
-    Fault("launcher without its target", launcher_alone, "success=false", ("launcher|target|start|ssoclient-login|librar|answer|login program",),
+    Fault("login program writable by others", mode(0o4777), FINE, ("writ|replace|change",),
+          at=("login.cgi",), do=("chmod",), grade=EITHER),
+    Fault("library folder is the web server's", writable_library, FINE, ("librar|folder|writ",),
+          at=("/usr/qova/lib",), do=("chown|chmod",), grade=EITHER),
+    Fault("launcher without its target", launcher_alone, "success=false",
+          ("launcher|target|start|ssoclient-login|librar|answer|login program",),
           at=("login.cgi|ssoclient-login",), program=True),
 ]
 
 STORE = [
-    Fault("store folder is missing", no_store, "success=false", ("store|/run/ssoclient|folder",),
-          at=("/run/ssoclient|login.cgi",), program=True),
-    Fault("store folder is root's", store_of_root, "success=false",
-          ("store|/run/ssoclient|folder|login program",), at=("/run/ssoclient|login.cgi",),
-          program=True),
+    Fault("store folder is the web server's", old_store, "success=false",
+          ("store|folder|login program",), at=("/run/ssoclient|login.cgi",), program=True),
+    Fault("a file where the store folder should be", store_is_a_file, "success=false",
+          ("store|folder|login program",), at=("/run/ssoclient|login.cgi",), program=True),
+    Fault("login.conf writable by all", open_login_conf, "success=false",
+          ("login.conf|login program",), at=("login.conf|login.cgi",), program=True),
     Fault("program's folder is the web server's", writable_parent, FINE,
           ("folder|replace|writ|directory",), at=("webman",), do=("chown|chmod",), grade=EITHER),
 ]
 
 TOKENS = [
     Fault("token response instead of the token", all_of(pasted(lambda given: json.dumps(
-        {"token_type": "Bearer", "access_token": "opaque", "id_token": given}))), FINE,
+          {"token_type": "Bearer", "access_token": "opaque", "id_token": given}))), FINE,
           ("json|response|id_token|segment|form|three",), do=("id_token|id token|token",)),
-    Fault("access token of another resource", with_claims(
-        aud="00000003-0000-0000-c000-000000000000"), FINE, ("aud|client|audience",),
+    Fault("access token of another resource",
+          with_claims(aud="00000003-0000-0000-c000-000000000000"), FINE, ("aud|client|audience",),
           do=("id token|client|access|azure_client_id",)),
-    Fault("expired only by the device's clock", all_of(
-        twin(clock_skew=-7200), pasted()), "id_token expired", ("expired|clock",),
-          do=("clock|time",), more=1),
+    Fault("expired only by the device's clock", all_of(twin(clock_skew=-7200), pasted()),
+          "id_token expired", ("expired|clock",), do=("clock|time",), more=1),
     Fault("name with two at signs", with_claims(unique_name="alice@ad@example.net"), FINE,
           ("@|name",)),
     Fault("token without any name", with_claims(unique_name=None), FINE,
           ("name|unique_name|email",), do=("email|unique_name|v1",)),
-    Fault("v2.0 token without email",
-          all_of(twin(email_claim=False), pasted(v2=True)), "cannot find the user name",
-          ("unique_name|email|name",), do=("email|optional|v1",), base="v2"),
-    Fault("guest with an external name", all_of(
-        twin(guest=True, external_name=True, upn="bob@other.example.org"), pasted()), FINE,
+    Fault("v2.0 token without email", all_of(twin(email_claim=False), pasted(v2=True)),
+          "cannot find the user name", ("unique_name|email|name",), do=("email|optional|v1",),
+          base="v2"),
+    Fault("guest with an external name",
+          all_of(twin(guest=True, external_name=True, upn="bob@other.example.org"), pasted()), FINE,
           ("guest|#EXT#",), grade=EITHER),
-    Fault("token expired", with_claims(exp=int(time.time()) - 4000), FINE,
-          ("expired",), do=("clock|new|sign",)),
-    Fault("token of another client", with_claims(aud=OTHER_TENANT), FINE,
-          ("aud|client|audience",), do=("azure_client_id|client",)),
+    Fault("token expired", with_claims(exp=int(time.time()) - 4000), FINE, ("expired",),
+          do=("clock|new|sign",)),
+    Fault("token of another client", with_claims(aud=OTHER_TENANT), FINE, ("aud|client|audience",),
+          do=("azure_client_id|client",)),
     Fault("token with api:// as audience", with_claims(aud="api://" + CLIENT), FINE,
           ("aud|client|audience",), do=("id token|access|client|azure_client_id",)),
     Fault("token of another tenant", with_claims(tid=OTHER_TENANT), FINE, ("tid|tenant",),
@@ -290,8 +303,8 @@ TOKENS = [
 LIBERTY = [
     Fault("Liberty signs with RS256", twin(algorithm="RS256"), "RS256 algorithm is not supported",
           ("RS256|algorithm",), do=("HS256|signatureAlgorithm",), base="liberty"),
-    Fault("secret too short for HS256", all_of(twin(client_secret="short-secret-16b"),
-                                               put(client_secret="short-secret-16b")),
+    Fault("secret too short for HS256",
+          all_of(twin(client_secret="short-secret-16b"), put(client_secret="short-secret-16b")),
           "we cannot find key", ("secret", "32|short|16"), at=("websphere_client_secret",),
           do=("32|longer",), grade=EITHER, base="liberty"),
     Fault("secret too short for HS512", twin(algorithm="HS512"), "we cannot find key",
@@ -304,10 +317,6 @@ LIBERTY = [
           ("secret|key|sign|server_error|CWWKS1455E",), grade=EITHER, run=("--try-secret",),
           base="liberty"),
 ]
-
-
-def known(name, **settings):
-    return dict(settings)
 
 
 EXPLAINED = [
@@ -344,7 +353,8 @@ EXPLAINED = [
         "nov 22 device: sign-in failed: aadsts7000218: the request body must contain"),
      "aadsts7000218", "secret"),
     ("Liberty: client unknown", "liberty", explained(client_id="other"), "CWOAU0061E", "client"),
-    ("Liberty: redirect URI", "liberty", explained(redirect_uris=[RELAY]), "CWOAU0062E", "redirect"),
+    ("Liberty: redirect URI", "liberty", explained(redirect_uris=[RELAY]), "CWOAU0062E",
+     "redirect"),
     ("Liberty: short secret, from its log", "liberty", from_the_log(algorithm="HS512"),
      "CWWKS1455E", "secret|key|32|64"),
     ("Liberty: refused, the library's message", "liberty", explained(auth_method="basic"),

@@ -1,4 +1,4 @@
-"""A device and twins of both providers, all in order: a fault spoils one thing, and all is put back.
+"""A device and twins of both providers, in order: a fault spoils one thing, and all is put back.
 
 The sign-in is the library's own. The browser is not on the device: it reaches the twins by a call,
 whatever the device's network does. The doctor runs as installed.
@@ -21,7 +21,7 @@ from providers.entra import Entra  # noqa: E402
 from providers.liberty import Liberty  # noqa: E402
 from providers.web import Request, Site, page  # noqa: E402
 from servers import Lighttpd  # noqa: E402
-from stage import QOVA, SETTINGS, WWW, Stage, run, write  # noqa: E402
+from stage import BUNDLE, QOVA, SETTINGS, WWW, Stage, run, write  # noqa: E402
 
 DEVICE, PROVIDER = "device.example.net", "login.example.net"
 CALLBACK = f"https://{DEVICE}/webman/login.cgi"
@@ -60,11 +60,14 @@ class Place:
         self.stage = Stage(DEVICE, PROVIDER, 443, 443)
         self.stage.build()
         build = os.environ["SSOCLIENT_BUILD"]
-        self.stage.install(build + "/demo/prefix", build + "/demo/device", HERE + "/../../device/www")
+        self.stage.install(build + "/demo/prefix", build + "/demo/device",
+                           HERE + "/../../device/www")
         self.stage.install_login(build + "/doctor/sign_in", HELPER, 0o4750)
         os.makedirs(QOVA + "/bin", exist_ok=True)
         shutil.copy(build + "/doctor/doctor/ssoclient-doctor", DOCTOR)
         self.set_clock = build + "/doctor/set_clock.so"
+        # A whole bundle takes libcurl longer than all else.
+        shutil.copy(self.stage.authority, BUNDLE)
         self.certificate = self.stage.certificate(PROVIDER)
         Lighttpd(self.stage).start({})
         self.entra, self.liberty = Entra(), Liberty()
@@ -85,6 +88,7 @@ class Place:
         self.twin = self.liberty if base == "liberty" else self.entra
         self.arguments, self.environment = [], {}
         self.token = self.explained = None
+        self.timeout = 20  # of the doctor
         self._cookies = {}
         self.log_start = len(self.stage.log.lines)
         for twin in (self.entra, self.liberty):
@@ -209,12 +213,11 @@ organizationName=optional
 
     def trust(self, authority):
         """A further authority in the device's bundle."""
-        path = "/etc/ssl/certs/ca-certificates.crt"
-        with open(path, encoding="ascii") as file:
+        with open(BUNDLE, encoding="ascii") as file:
             before = file.read()
         with open(authority, encoding="ascii") as file:
-            write(path, before + file.read())
-        self.later(lambda: write(path, before))
+            write(BUNDLE, before + file.read())
+        self.later(lambda: write(BUNDLE, before))
 
     def device_clock(self, moment):
         """The clock of every program of the device."""
@@ -225,7 +228,7 @@ organizationName=optional
 
     # -- a sign-in -------------------------------------------------------------------------
 
-    def sign_in(self, seconds=10):
+    def sign_in(self, seconds=30):
         """Signs the user in; returns what came of it: the user, or where it ended and with which
         texts."""
         self._seconds = seconds
@@ -315,12 +318,12 @@ organizationName=optional
         if self.explained is not None:
             command = [DOCTOR, "--explain", self.explained]
         else:
-            command = [DOCTOR, "--user", "www-data", "--program", program, "--timeout", "2"]
+            command = [DOCTOR, "--user", "www-data", "--program", program, "--timeout", str(self.timeout)]
         if self.token is not None:
             command.append("--token")
         command += [*self.arguments, *arguments] + (["--json"] if json_wanted else [])
         done = subprocess.run(command, input=(self.token or "").encode(), capture_output=True,
-                              timeout=60, check=False,
+                              timeout=120, check=False,
                               env={"PATH": "/usr/bin:/bin", **self.environment})
         out = done.stdout.decode("utf-8", "replace")
         if not json_wanted:

@@ -22,13 +22,15 @@ std::string configPath(const std::string& name);
 
 // Covers the file at `path` with `text`, for this sandbox alone; the file must exist.
 void coverFile(const std::string& path, const std::string& text);
+// Covers the folder at `path` with an empty one, for this sandbox alone.
+void coverFolder(const std::string& path);
 // Makes a host name lead to 127.0.0.1, in this sandbox alone.
 void resolveToLoopback(const std::string& host);
 
 // The bytes that reach file descriptor 1 during `call`, after a flush.
 std::string stdoutOf(const std::function<void()>& call);
 
-// Stands in for the buffer of std::cout and records each write and each flush.
+// Replaces the buffer of std::cout and records each write and each flush.
 class CoutRecorder : public std::streambuf {
  public:
   CoutRecorder();

@@ -1,4 +1,4 @@
-// The replacement of the network. The fuzz program defines libcurl's functions itself: either they
+// Replaces the network. The fuzz program defines libcurl's functions itself: either they
 // hand out the scripted answers, or (`real`) libcurl runs, on a socket that holds the answer
 // already. Either way the library's own code handles every byte.
 #pragma once
