@@ -37,6 +37,8 @@ inline std::ostream& operator<<(std::ostream& out, const SeededFault& fault) {
 }
 
 std::vector<SeededFault> allFaults();
-std::vector<SeededFault> wayFaults();  // between device and provider; network_faults.cpp
+// Parts of them: of local_faults.cpp, and of network_faults.cpp (between device and provider).
+std::vector<SeededFault> localFaults();
+std::vector<SeededFault> wayFaults();
 
 }  // namespace test
