@@ -37,8 +37,7 @@ inline std::ostream& operator<<(std::ostream& out, const SeededFault& fault) {
 }
 
 std::vector<SeededFault> allFaults();
-// Parts of them: of local_faults.cpp, and of network_faults.cpp (between device and provider).
-std::vector<SeededFault> localFaults();
-std::vector<SeededFault> wayFaults();
+std::vector<SeededFault> localFaults();  // those of local_faults.cpp, which are among them
+std::vector<SeededFault> wayFaults();  // between device and provider; network_faults.cpp
 
 }  // namespace test

@@ -208,7 +208,7 @@ HEALTHY = [
     ("tenant's domain in the URLs", "v1", everywhere(TENANT, "ad.example.net"), ()),
     ("tenant's domain in the URLs of v2.0", "v2", everywhere(TENANT, "ad.example.net"),
      ("--try-secret",)),
-    ("host in capital letters", "v1", everywhere("login.example.net", "LOGIN.example.net"), ()),
+    ("host in upper case", "v1", everywhere("login.example.net", "LOGIN.example.net"), ()),
     ("port 443 in the URLs", "v1", everywhere("login.example.net", "login.example.net:443"), ()),
     ("escaped slashes", "v1", replace("/", "\\/"), ()),
     ("login program behind a link", "v1", program_behind_a_link, ()),
