@@ -46,7 +46,7 @@ class Page:
 
     @property
     def location(self):
-        """Where a redirect points, as an absolute URL; None when the page is no redirect."""
+        """Where a redirect points, as an absolute URL; None when the page is not a redirect."""
         target = self.headers.get("Location")
         if self.status not in (301, 302, 303, 307, 308) or target is None:
             return None
@@ -89,7 +89,7 @@ class Browser:
         return self._send(urllib.request.Request(url.split("#")[0], headers=headers or {}), url)
 
     def submit(self, page, identity):
-        """Sends a form of a page as it stands."""
+        """Sends a form of a page unchanged."""
         form = page.form(identity)
         url = urllib.parse.urljoin(page.url, form.get("action", ""))
         if form.get("method", "get").lower() == "get":

@@ -113,7 +113,7 @@ class Tab:
     # -- what a person does ----------------------------------------------------------------
 
     def open(self, url):
-        """Goes to an address. Where the browser shows a page of its own instead, that is it."""
+        """Goes to an address. Where the browser shows its own page instead, that is it."""
         try:
             self.driver.get(url)
         except WebDriverException as error:

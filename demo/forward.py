@@ -1,9 +1,9 @@
-"""A door from this machine's loopback into the demo's network namespace.
+"""A relay from this machine's loopback into the demo's network namespace.
 
 Called as a program, before the namespace is made, it opens listening sockets and runs a
 command that inherits them: a socket belongs to the network in which it was opened, whoever
 accepts on it. start() then runs inside and hands each connection on to the same port there.
-The command, and with it the namespace, ends when this program is told to end.
+The command, and with it the namespace, ends when this program ends.
 """
 
 import signal
@@ -35,10 +35,10 @@ def carry(outer, port):
         back.join()
 
 
-def _accept(door):
-    port = door.getsockname()[1]
+def _accept(listener):
+    port = listener.getsockname()[1]
     while True:
-        outer, _ = door.accept()
+        outer, _ = listener.accept()
         threading.Thread(target=carry, args=(outer, port), daemon=True).start()
 
 
@@ -49,19 +49,19 @@ def start(descriptors):
 
 
 def _open(port):
-    door = socket.socket()
-    door.setsockopt(socket.SOL_SOCKET, socket.SO_REUSEADDR, 1)
+    listener = socket.socket()
+    listener.setsockopt(socket.SOL_SOCKET, socket.SO_REUSEADDR, 1)
     try:
-        door.bind(("127.0.0.1", port))
+        listener.bind(("127.0.0.1", port))
     except OSError as error:
         sys.exit(f"demo: port {port} of 127.0.0.1: {error.strerror}; give another one with --port")
-    door.listen(64)
-    return door
+    listener.listen(64)
+    return listener
 
 
 def main():
-    doors = [_open(int(port)) for port in sys.argv[1:3]]
-    descriptors = [door.fileno() for door in doors]
+    listeners = [_open(int(port)) for port in sys.argv[1:3]]
+    descriptors = [listener.fileno() for listener in listeners]
     signals = {signal.SIGINT, signal.SIGTERM, signal.SIGHUP, signal.SIGCHLD}
     signal.pthread_sigmask(signal.SIG_BLOCK, signals)
     for number in signals:  # an ignored signal would not even be waited for
@@ -69,8 +69,8 @@ def main():
     with subprocess.Popen(sys.argv[3:] + ["--sockets", *map(str, descriptors)],
                           pass_fds=descriptors, preexec_fn=lambda: signal.pthread_sigmask(
                               signal.SIG_UNBLOCK, signals)) as command:
-        for door in doors:
-            door.close()
+        for listener in listeners:
+            listener.close()
         if signal.sigwait(signals) == signal.SIGCHLD:
             return command.wait()
         # The namespace goes with its first process, and nothing of it is outside.

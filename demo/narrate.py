@@ -1,7 +1,7 @@
 """Says what happens on the stage while it happens: what the browser, the login program, the library
 and the provider do.
 
-Relays stand in front of the web server and the provider and see each request and answer; the system
+Relays are in front of the web server and the provider and see each request and answer; the system
 log is read as well. Codes, tokens, secrets and cookies' values are never printed.
 """
 

@@ -169,24 +169,24 @@ http {{
 """
 
     def start(self, environment):
-        door = FOLDER + "/fcgi/socket"
-        os.makedirs(os.path.dirname(door), exist_ok=True)
-        shutil.chown(os.path.dirname(door), WEB_USER)
-        if os.path.exists(door):
-            os.unlink(door)
+        address = FOLDER + "/fcgi/socket"
+        os.makedirs(os.path.dirname(address), exist_ok=True)
+        shutil.chown(os.path.dirname(address), WEB_USER)
+        if os.path.exists(address):
+            os.unlink(address)
         path = self._write(
-            self.CONFIG, socket=door,
+            self.CONFIG, socket=address,
             headers="\n    ".join(f'add_header {name} "{value}" always;'
                                   for name, value in HEADERS.items()),
             environment="\n      ".join(f'fastcgi_param {name} "{value}";'
                                         for name, value in environment.items()))
-        self.stage.spawn("fcgiwrap", ["fcgiwrap", "-s", "unix:" + door, "-c", "4"], WEB_USER)
+        self.stage.spawn("fcgiwrap", ["fcgiwrap", "-s", "unix:" + address, "-c", "4"], WEB_USER)
         self.stage.spawn("nginx", ["nginx", "-c", path, "-e", f"{self.stage.logs}/nginx.out"])
         self.stage.wait_for("nginx", self.stage.device_port)
 
 
 class Busybox(Server):
-    """Runs programs below /cgi-bin alone, and knows no TLS: a door in front of it does."""
+    """Runs programs below /cgi-bin alone, and has no TLS: a proxy in front of it adds that."""
     title = "busybox httpd"
     processes = ("busybox",)
     login = "/cgi-bin/login.cgi"

@@ -100,7 +100,7 @@ class Checks:
             raise CheckError("the device page says: " + page.text)
 
     def _expect_logged(self, text, first):
-        """The log is read by a thread of its own, which may be behind."""
+        """The log is read by its own thread, which may be behind."""
         end = time.monotonic() + 10
         while not any(text in line for line in self.scene.stage.log.lines[first:]):
             if time.monotonic() > end:
@@ -121,7 +121,7 @@ class Checks:
         if not self.directory.knows_user(self.scene.users["azure"]):
             raise CheckError("unknown")
         if self.directory.knows_user(f"{NETBIOS}\\nobody-there"):
-            raise CheckError("it knows everybody")
+            raise CheckError("it knows everyone")
 
     def run(self):
         principal = f"alice@{DNS}"

@@ -63,16 +63,6 @@ std::string ClassName(const std::exception& e) {
   return status == 0 ? name.get() : typeid(e).name();
 }
 
-void Become(const Caller& caller) {
-  const gid_t saved_gid = caller.saved_root ? 0 : caller.gid;
-  const uid_t saved_uid = caller.saved_root ? 0 : caller.uid;
-  if (setgroups(caller.groups.size(), caller.groups.data()) != 0 ||
-      setresgid(caller.gid, caller.gid, saved_gid) != 0 ||
-      setresuid(caller.uid, caller.uid, saved_uid) != 0) {
-    throw std::system_error(errno, std::generic_category(), "cannot become " + caller.name);
-  }
-}
-
 void WriteAll(int descriptor, const std::string& text) {
   for (size_t done = 0; done < text.size();) {
     const ssize_t count = write(descriptor, text.data() + done, text.size() - done);
@@ -81,11 +71,9 @@ void WriteAll(int descriptor, const std::string& text) {
   }
 }
 
-// The child's half: standard error becomes the log, the answer goes to `out`.
-void AnswerQuestion(const std::function<Json::Value()>& question, const Caller* caller, int log,
-                    int out) {
+// The child's half: the log goes to standard error, the answer to `out`.
+void AnswerQuestion(const std::function<Json::Value()>& question, const Caller* caller, int out) {
   Json::Value reply(Json::objectValue);
-  dup2(log, STDERR_FILENO);
   openlog(kLogName, LOG_PERROR, LOG_USER);
   try {
     if (caller != nullptr) Become(*caller);
@@ -179,23 +167,47 @@ std::vector<Said> Reply::ErrorLines() const {
   return lines;
 }
 
-Reply Ask(const std::function<Json::Value()>& question, int seconds, const Caller* caller) {
+void Become(const Caller& caller) {
+  const gid_t saved_gid = caller.saved_root ? 0 : caller.gid;
+  const uid_t saved_uid = caller.saved_root ? 0 : caller.uid;
+  if (setgroups(caller.groups.size(), caller.groups.data()) != 0 ||
+      setresgid(caller.gid, caller.gid, saved_gid) != 0 ||
+      setresuid(caller.uid, caller.uid, saved_uid) != 0) {
+    throw std::system_error(errno, std::generic_category(), "cannot become " + caller.name);
+  }
+}
+
+Output Capture(const std::function<void(int out)>& body, int seconds) {
   const auto deadline = Clock::now() + std::chrono::seconds(seconds);
   Pipe log;
   Pipe answer;
   const pid_t child = fork();
   if (child < 0) throw std::system_error(errno, std::generic_category(), "fork");
   if (child == 0) {
-    AnswerQuestion(question, caller, log.write_end, answer.write_end);
+    setpgid(0, 0);
+    dup2(log.write_end, STDERR_FILENO);
+    body(answer.write_end);
     _exit(0);
   }
   log.CloseWriting();
   answer.CloseWriting();
   std::array<Stream, 2> streams = {Stream{log.read_end, ""}, Stream{answer.read_end, ""}};
-  if (!Collect(streams, deadline)) kill(child, SIGKILL);
-  while (waitpid(child, nullptr, 0) < 0 && errno == EINTR) {
+  Output output;
+  output.ended = Collect(streams, deadline);
+  if (!output.ended) {
+    kill(-child, SIGKILL);
+    kill(child, SIGKILL);
   }
-  return MakeReply(streams[0].text, streams[1].text);
+  while (waitpid(child, &output.status, 0) < 0 && errno == EINTR) {
+  }
+  output.err = streams[0].text;
+  output.out = streams[1].text;
+  return output;
+}
+
+Reply Ask(const std::function<Json::Value()>& question, int seconds, const Caller* caller) {
+  const Output output = Capture([&](int out) { AnswerQuestion(question, caller, out); }, seconds);
+  return MakeReply(output.err, output.out);
 }
 
 }  // namespace doctor

@@ -38,6 +38,21 @@ struct Reply {
   std::vector<Said> ErrorLines() const;
 };
 
+// Output is what a child process wrote, and how it ended.
+struct Output {
+  bool ended = false;  // before the deadline
+  int status = 0;      // as of waitpid
+  std::string out;
+  std::string err;
+};
+
+// Runs `body` in a child process, with its standard error and the descriptor `out` read, for at
+// most `seconds`; what it started is ended with it.
+Output Capture(const std::function<void(int out)>& body, int seconds);
+
+// Takes on the identity for good. Throws std::system_error.
+void Become(const Caller& caller);
+
 // Runs `question` in a child process, for at most `seconds`, as `caller` (null: as we are).
 Reply Ask(const std::function<Json::Value()>& question, int seconds,
           const Caller* caller = nullptr);

@@ -16,18 +16,15 @@ std::vector<Said> SendsTheBrowser() {
   return {Said::Does("sends the browser there, and does not see what comes of it")};
 }
 
-std::string Fix(const Checkup& checkup) {
-  const std::string& url = checkup.settings.authorization_endpoint;
-  const std::string there = checkup.Documented("authorization_endpoint", url);
-  return "Set " + checkup.Key("authorization_endpoint") + " to " +
-         (there.empty() ? "the URL of the provider's authorization endpoint" : Shown(there, 200)) +
-         ".";
-}
-
 // True if the redirect leads back to the device.
 bool IsBack(const Checkup& checkup, const WebAnswer& answer) {
   const std::string& uri = checkup.settings.redirect_uri;
   return IsRedirect(answer) && !uri.empty() && answer.location.compare(0, uri.size(), uri) == 0;
+}
+
+// Some providers send their login page with an error status.
+bool IsLogin(const WebAnswer& answer) {
+  return answer.asks_login || LowerCase(answer.body).find("password") != std::string::npos;
 }
 
 // What the answer says of the request; an empty id if a person could sign in there.
@@ -50,12 +47,12 @@ Finding Fault(const Checkup& checkup, const WebAnswer& answer) {
   } else if (answer.status == 404 || answer.status == 405 || answer.status == 410 || json) {
     finding.id = "authorization-wrong";
     finding.cause = "The server has no authorization endpoint at this URL" + described;
-    finding.action = Fix(checkup);
+    finding.action = checkup.Fix("authorization_endpoint", checkup.settings.authorization_endpoint);
   } else if (answer.status >= 500) {
     finding.id = "authorization-error";
     finding.cause = "The authorization endpoint has an internal error" + described;
     finding.action = "Check the provider and its log.";
-  } else if (answer.status >= 400 && !(answer.status == 401 && answer.asks_login)) {
+  } else if (answer.status >= 400 && !IsLogin(answer)) {
     finding.id = "authorization-odd";
     finding.grade = answer.status == 400 ? Grade::kFailure : Grade::kWarning;
     finding.cause = "The provider refuses the request of a browser" + described;
@@ -71,7 +68,7 @@ void CheckAuthorization(Checkup& checkup) {
                        Grade::kFailure, SendsTheBrowser};
   if (!checkup.IsWorthRequest(endpoint.url)) return;
   if (!checkup.Documented("authorization_endpoint", endpoint.url).empty()) {
-    endpoint.fix = Fix(checkup);
+    endpoint.fix = checkup.Fix("authorization_endpoint", endpoint.url);
   }
   endpoint.page = true;
   const std::string host = ParsedUrl(endpoint.url).host();

@@ -29,6 +29,9 @@ struct Checkup {
   std::string settings_file;
   Settings settings;
   std::set<std::string> bad_urls;  // not worth a request: there is a finding
+  std::set<std::string> bad_keys;  // the same for keys of the settings file
+  bool reference_program = false;  // the login program is the reference's
+  int login_deadline = 20;         // its, in seconds
   std::string tenant;              // the library has no accessor for it
   std::string network_obstacle;    // the finding that kept the key set away
   Json::Value discovery;           // the document; null: there is none
@@ -54,6 +57,8 @@ struct Checkup {
 
   // The URL that the discovery document has in place of a configured one; empty: none or the same.
   std::string Documented(const std::string& name, const std::string& configured) const;
+  // What to do about a URL of an endpoint that leads nowhere: the action of a finding.
+  std::string Fix(const std::string& name, const std::string& configured) const;
 
   struct ServerTime {
     std::string server;
@@ -66,6 +71,16 @@ struct Checkup {
 // identity.cpp: who the login program is, and that the guard can raise its ids.
 void FindCaller(Checkup& checkup);
 void CheckIdentity(Checkup& checkup);
+
+// program.cpp: the login program, which is run with a request that changes nothing. False if it
+// does not get root.
+bool CheckProgram(Checkup& checkup, Caller caller);
+
+// login.cpp: what the reference login program keeps beside the library: its settings and its
+// store; and its deadline, once the provider has answered.
+void CheckLoginSettings(Checkup& checkup);
+void CheckStore(Checkup& checkup);
+void CheckDeadline(Checkup& checkup);
 
 // files.cpp: the three files and their keys.
 void CheckFiles(Checkup& checkup);

@@ -97,19 +97,13 @@ class Consistency {
       const size_t role = RoleOf(*urls[i]);
       const bool other = ShapeOf(*urls[i]).role == "other";
       if (urls[i]->empty() || role == i || (role == kRoles.size() && !other)) continue;
-      const std::string right = checkup.Documented(kRoles[i].key, *urls[i]);
       const bool unused = i == 2 || (i == 3 && !checkup.azure());
       checkup.bad_urls.insert(*urls[i]);
-      checkup.report.Add(
-          {"endpoint-other", unused ? Grade::kWarning : Grade::kFailure,
-           Quote(checkup.Key(kRoles[i].key)) + " is not the URL of the " + kRoles[i].name +
-               (other ? "" : ", but of the " + std::string(kRoles[role].name)),
-           At(i),
-           "Set " + checkup.Key(kRoles[i].key) + " to " +
-               (right.empty() ? "the URL of the provider's " + std::string(kRoles[i].name)
-                              : Shown(right, 200)) +
-               ".",
-           Evidence(i)});
+      checkup.report.Add({"endpoint-other", unused ? Grade::kWarning : Grade::kFailure,
+                          Quote(checkup.Key(kRoles[i].key)) + " is not the URL of the " +
+                              kRoles[i].name +
+                              (other ? "" : ", but of the " + std::string(kRoles[role].name)),
+                          At(i), checkup.Fix(kRoles[i].key, *urls[i]), Evidence(i)});
     }
   }
 
@@ -200,6 +194,19 @@ std::string Checkup::Documented(const std::string& name, const std::string& conf
     if (name != role.key || role.member == nullptr) continue;
     const std::string there = StringOf(discovery, role.member);
     return IsSameEndpoint(there, configured) ? "" : there;
+  }
+  return "";
+}
+
+std::string Checkup::Fix(const std::string& name, const std::string& configured) const {
+  for (const Role& role : kRoles) {
+    if (name != role.key) continue;
+    const std::string there = role.member != nullptr ? StringOf(discovery, role.member) : "";
+    return "Set " + Key(name) + " to " +
+           (there.empty() || there == configured
+                ? "the URL of the provider's " + std::string(role.name)
+                : Shown(there, 200)) +
+           ".";
   }
   return "";
 }

@@ -16,7 +16,7 @@ namespace doctor {
 
 namespace {
 
-constexpr long kSlow = 1000;  // milliseconds that a person notices
+constexpr long kSlow = 800;  // milliseconds that a person notices
 
 // The proxies of this process, with the passwords that their URLs may hold.
 void NoteProxy(Checkup& checkup) {
@@ -112,6 +112,19 @@ class Discovery {
   WebAnswer answer;
 };
 
+// The provider's algorithm needs a secret of so many bytes; SHA-256's are checked elsewhere.
+void CheckLength(Checkup& checkup, size_t least) {
+  const size_t length = checkup.settings.client_secret.size();
+  if (checkup.azure() || length < 32 || length >= least) return;
+  checkup.report.Warn("secret-short",
+                      "The client secret has " + std::to_string(length) +
+                          " bytes; the provider's algorithm needs " + std::to_string(least),
+                      checkup.At("client_secret"),
+                      "Set a random client secret of " + std::to_string(least) +
+                          " bytes or more, here and at the provider.",
+                      {Said::Does("accepts any length; new versions of Liberty do not")});
+}
+
 // The algorithms that the provider says it signs with. `kid`: of a key that can be used.
 void CheckAlgorithms(Checkup& checkup, const std::string& kid) {
   const Json::Value& document = checkup.discovery;
@@ -123,7 +136,7 @@ void CheckAlgorithms(Checkup& checkup, const std::string& kid) {
   for (const Json::Value& name : offered) {
     if (!name.isString()) continue;
     for (const char* size : {"256", "384", "512"}) {
-      if (name.asString() == prefix + size) return;
+      if (name.asString() == prefix + size) return CheckLength(checkup, std::stoul(size) / 8);
     }
     names += (names.empty() ? "" : ", ") + Shown(name.asString(), 20);
   }

@@ -5,8 +5,11 @@
 
 #include <cerrno>
 #include <cstring>
+#include <filesystem>
 
+#include "doctor/characters.h"
 #include "doctor/json.h"
+#include "doctor/paths.h"
 #include "doctor/redact.h"
 #include "doctor/text.h"
 
@@ -14,7 +17,8 @@ namespace doctor {
 
 namespace {
 
-constexpr size_t kLongestFile = 1 << 20;
+constexpr size_t kLongestFile = 64 << 20;
+constexpr off_t kLargeFile = 1 << 20;  // a settings file has some hundred bytes
 
 bool StartsWith(const std::string& text, const std::string& start) {
   return text.compare(0, start.size(), start) == 0;
@@ -41,10 +45,7 @@ class FileCheck {
         good_mode(found.kind.secret ? "0600" : "0644") {}
 
   bool Run(Json::Value& document) {
-    if (file.error == ENOENT || file.error == ENOTDIR) {
-      return in_use && Unusable("file-missing", name + " does not exist",
-                                "Create it: a JSON object, owner root, mode " + good_mode + ".");
-    }
+    if (file.error == ENOENT || file.error == ENOTDIR) return in_use && Missing();
     if (file.error == EACCES && geteuid() != 0) {
       checkup.report.Unchecked("file-not-checked",
                                name + " cannot be read by the user of this command", file.At(),
@@ -60,6 +61,30 @@ class FileCheck {
   }
 
  private:
+  bool Missing() {
+    const auto missing = [this](const std::string& cause, const std::string& action) {
+      return Unusable("file-missing", cause, action);
+    };
+    struct stat status = {};
+    if (lstat(file.path.c_str(), &status) == 0) {
+      return missing(name + " is a symbolic link to a file that does not exist",
+                     "Create the file that it leads to, or put a regular file in its place: "
+                     "readlink -f " +
+                         file.path);
+    }
+    if (stat(kFolder, &status) != 0 || !S_ISDIR(status.st_mode)) {
+      return missing("The folder of the settings does not exist",
+                     std::string("mkdir -p -m 0755 ") + kFolder + ", and create the files in it.");
+    }
+    const std::string near = NearMiss(name);
+    if (near.empty()) {
+      return missing(name + " does not exist",
+                     "Create it: a JSON object, owner root, mode " + good_mode + ".");
+    }
+    return missing(name + " does not exist, but " + Quote(near) + " does",
+                   "mv '" + near + "' " + file.path);
+  }
+
   // The file of the other provider keeps no user from signing in.
   bool Unusable(const char* id, const std::string& cause, const std::string& action) {
     checkup.report.Add({id, in_use ? Grade::kFailure : Grade::kWarning, cause, file.At(), action,
@@ -68,10 +93,16 @@ class FileCheck {
   }
 
   std::string Unreadable() const {
-    if (S_ISDIR(file.status.st_mode)) return "is a directory";
-    if (!S_ISREG(file.status.st_mode) && file.error == 0) return "is not a regular file";
+    const mode_t mode = file.status.st_mode;
+    if (S_ISDIR(mode)) return "is a directory";
+    if (S_ISFIFO(mode)) return "is a named pipe, not a regular file";
+    if (S_ISSOCK(mode)) return "is a socket, not a regular file";
+    if (S_ISCHR(mode) || S_ISBLK(mode)) return "is a device, not a regular file";
+    if (file.error == EFBIG) return "is " + Megabytes() + " large";
     return "cannot be read: " + std::string(std::strerror(file.error));
   }
+
+  std::string Megabytes() const { return std::to_string(file.status.st_size >> 20) + " MB"; }
 
   void Warn(const char* id, const std::string& cause, const std::string& action) {
     checkup.report.Warn(id, cause, file.At(), action,
@@ -92,15 +123,35 @@ class FileCheck {
            "Users other than root can change " + name + " and so decide who signs in (owner " +
                std::to_string(file.status.st_uid) + ", " + shown + ")",
            "chown root:root " + file.path + "; chmod " + good_mode + " " + file.path);
+    } else if (const auto spot = WritableByOthers(file.path)) {
+      Warn("folder-writable",
+           "Users other than root can replace " + name + ": " + spot->path + " is writable (" +
+               spot->Owner() + ")",
+           spot->Command());
+    }
+    if (file.status.st_size > kLargeFile) {
+      Warn("file-odd", name + " is " + Megabytes() + " large, which each sign-in reads",
+           "Remove what is not part of the settings.");
     }
   }
 
   bool CheckText(Json::Value& document) {
     const std::string& text = file.text;
-    const std::string save = "Save it as UTF-8 without a byte-order mark.";
     if (text.find_first_not_of(" \t\r\n") == std::string::npos) {
       return Unusable("file-empty", name + " is empty", "Write a JSON object into it.");
     }
+    std::string problem;
+    if (!ParseJson(text, document, problem)) return NotJson(problem);
+    if (!document.isObject()) {
+      return Unusable("file-no-object", name + " holds " + TypeName(document) + ", not an object",
+                      "Put the members between { and }.");
+    }
+    return true;
+  }
+
+  bool NotJson(const std::string& problem) {
+    const std::string& text = file.text;
+    const std::string save = "Save it as UTF-8 without a byte-order mark.";
     if (StartsWith(text, "\xEF\xBB\xBF")) {
       return Unusable("file-byte-order-mark", name + " begins with a byte-order mark (EF BB BF)",
                       save);
@@ -109,23 +160,15 @@ class FileCheck {
         text.find('\0') != std::string::npos) {
       return Unusable("file-encoding", name + " is not UTF-8 (UTF-16, or zero bytes in it)", save);
     }
-    std::string problem;
-    if (!ParseJson(text, document, problem)) {
-      return Unusable("file-syntax", name + " is not JSON: " + problem,
-                      "Fix the text there: names and strings in double quotes, a comma between "
-                      "members, none after the last.");
-    }
-    if (!document.isObject()) {
-      return Unusable("file-no-object", name + " holds " + TypeName(document) + ", not an object",
-                      "Put the members between { and }.");
-    }
-    const std::string odd = OddJson(text);
+    size_t at = 0;
+    const std::string odd = OddOutsideStrings(text, at);
     if (!odd.empty()) {
-      checkup.report.Warn("file-odd", "In " + name + " " + odd, file.At(),
-                          "Remove what is not meant.",
-                          {Said::Does("reads the file anyway; of two members the last counts")});
+      return Unusable("file-syntax", name + " is not JSON: " + Position(text, at) + ": " + odd,
+                      "Replace it there: quotation marks are \", and blanks are plain.");
     }
-    return true;
+    return Unusable("file-syntax", name + " is not JSON: " + problem,
+                    "Fix the text there: names and strings in double quotes, a comma between "
+                    "members, none after the last, true and false in lower case.");
   }
 
   Checkup& checkup;
@@ -144,7 +187,7 @@ File Load(const FileKind& kind) {
   const int descriptor = open(file.path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
   if (descriptor < 0) {
     file.error = errno;
-    stat(file.path.c_str(), &file.status);
+    if (stat(file.path.c_str(), &file.status) != 0) file.status = {};
     return file;
   }
   fstat(descriptor, &file.status);
@@ -155,18 +198,31 @@ File Load(const FileKind& kind) {
     file.text.append(chunk, static_cast<size_t>(count));
   }
   if (count < 0) file.error = errno;
+  if (file.text.size() >= kLongestFile) file.error = EFBIG;
   close(descriptor);
   return file;
 }
 
-bool CheckFile(Checkup& checkup, const File& file, bool in_use, Json::Value& document) {
-  return FileCheck(checkup, file, in_use).Run(document);
+std::string NearMiss(const std::string& name) {
+  const std::string stem = name.substr(0, name.find('.'));
+  for (const char* folder : {kFolder, "/usr/qova/etc/", "/etc/ssoclient/"}) {
+    std::error_code error;
+    for (const auto& entry : std::filesystem::directory_iterator(folder, error)) {
+      const std::string file = entry.path().filename();
+      const std::string plain = Skeleton(file);
+      if (file[0] == '.' || !entry.is_regular_file(error)) continue;
+      if (folder == std::string(kFolder) && FindKind(file) != nullptr) continue;
+      if (Nearest(plain, {name}) == name || Nearest(plain.substr(0, name.size()), {name}) == name ||
+          Nearest(plain.substr(0, plain.find('.')), {stem}) == stem) {
+        return Shown(entry.path(), 200);
+      }
+    }
+  }
+  return "";
 }
 
-std::string Mode(const struct stat& status) {
-  char text[16];
-  std::snprintf(text, sizeof text, "%04o", static_cast<unsigned>(status.st_mode & 07777));
-  return text;
+bool CheckFile(Checkup& checkup, const File& file, bool in_use, Json::Value& document) {
+  return FileCheck(checkup, file, in_use).Run(document);
 }
 
 }  // namespace doctor

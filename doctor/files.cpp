@@ -2,89 +2,20 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <filesystem>
 
+#include "doctor/characters.h"
 #include "doctor/checkup.h"
 #include "doctor/file.h"
 #include "doctor/json.h"
 #include "doctor/keys.h"
+#include "doctor/paths.h"
 #include "doctor/redact.h"
 #include "doctor/text.h"
 
 namespace doctor {
 
 namespace {
-
-// --- keys
-
-// The key of this file that the unknown one is most likely meant to be; null if there is none.
-const Key* MeantKey(const FileKind& kind, const std::string& key) {
-  std::vector<std::string> names;
-  for (const Key& known : kind.keys) names.push_back(known.name);
-  std::string near = Nearest(key, names);
-  if (near.empty() && !kind.prefix.empty()) near = Nearest(kind.prefix + key, names);
-  return FindKey(kind, near);
-}
-
-// Adds a key that the library does not know. True if it is a misspelling of the key that it
-// names, which the file does not have.
-bool AddUnknownKey(Checkup& checkup, const File& file, const std::string& key,
-                   const Json::Value& document, bool in_use) {
-  const Key* meant = MeantKey(file.kind, key);
-  std::string action = "Remove it.";
-  if (meant != nullptr) action = "Rename it to " + Quote(meant->name) + ".";
-  for (const FileKind& other : kFileKinds) {
-    if (&other == &file.kind || FindKey(other, key) == nullptr) continue;
-    action = Quote(key) + " belongs in " + other.name + ".";
-    meant = nullptr;
-  }
-  const bool missed = meant != nullptr && !document.isMember(meant->name);
-  checkup.report.Add({"key-unknown",
-                      missed && meant->needed && in_use ? Grade::kFailure : Grade::kWarning,
-                      Quote(Shown(key, 60)) + " is not a key of " + file.kind.name,
-                      file.At(Shown(key, 60)),
-                      action,
-                      {Said::Does("ignores it without a message")}});
-  return missed;
-}
-
-// What keeps a key from having an effect; empty if nothing does.
-std::string KeyFault(const Key& key, const Json::Value& document, std::string& seen) {
-  if (!document.isMember(key.name)) {
-    seen = "is missing";
-    return "key-missing";
-  }
-  const Json::Value& value = document[key.name];
-  const bool boolean = key.type == Json::booleanValue;
-  if (boolean ? !value.isBool() : !value.isString()) {
-    seen = "is " + TypeName(value) + (boolean ? ", not true or false" : ", not a string");
-    return "key-wrong-type";
-  }
-  if (value.isString() && value.asString().empty()) {
-    seen = "is empty";
-    return "key-empty";
-  }
-  return "";
-}
-
-void CheckKeys(Checkup& checkup, const File& file, bool in_use, const Json::Value& document) {
-  std::set<const Key*> misspelt;
-  for (const std::string& key : document.getMemberNames()) {
-    if (FindKey(file.kind, key) != nullptr) continue;
-    if (AddUnknownKey(checkup, file, key, document, in_use)) {
-      misspelt.insert(MeantKey(file.kind, key));
-    }
-  }
-  for (const Key& key : file.kind.keys) {
-    std::string seen;
-    const std::string id = KeyFault(key, document, seen);
-    if (id.empty() || (!in_use && id == "key-missing")) continue;
-    checkup.report.Add({id, in_use && key.needed ? Grade::kFailure : Grade::kWarning,
-                        Quote(key.name) + " " + seen, file.At(key.name),
-                        "Set " + Quote(key.name) + " to " + key.meaning + ".",
-                        in_use ? WithoutKey(checkup, key) : std::vector<Said>(),
-                        misspelt.count(&key) > 0 ? "key-unknown" : ""});
-  }
-}
 
 // --- the profile file
 
@@ -106,18 +37,31 @@ void CheckProfile(Checkup& checkup, const File& file, const Json::Value& documen
                         "Set \"sso_enable\" to true.", checkup.library.Login().said);
   }
   if (!known && !name.empty()) {
-    const std::string near = Nearest(name, {"azure", "websphere"});
-    checkup.report.Add(
-        {"profile-unsupported", Grade::kFailure,
-         "The profile " + Quote(Shown(name, 60)) + " does not exist", file.At("sso_profile"),
-         "Set \"sso_profile\" to " + (near.empty() ? "\"azure\" or \"websphere\"" : Quote(near)) +
-             ", in lower case.",
-         UnsupportedProfile(checkup)});
+    const std::string near = Nearest(Skeleton(name), {"azure", "websphere"});
+    const std::string odd = OddCharacter(name);
+    checkup.report.Add({"profile-unsupported", Grade::kFailure,
+                        "The profile " + Quote(Shown(name, 60)) + " does not exist" +
+                            (odd.empty() ? "" : ": it holds " + odd),
+                        file.At("sso_profile"),
+                        "Set \"sso_profile\" to " +
+                            (near.empty() ? "\"azure\" or \"websphere\"" : Quote(near)) +
+                            ", in lower case.",
+                        UnsupportedProfile(checkup)});
   }
   if (!off && known && document["sso_enable"].isBool()) {
     checkup.report.Good("profile", "Single sign-on is on, with the profile " + Quote(name),
                         file.At());
   }
+}
+
+// The command that lets users read the file.
+std::string Opening(const File& file, const Spot& closed) {
+  if (closed.path == file.path) return "chmod 0644 " + file.path;
+  if (file.path.compare(0, closed.path.size(), closed.path) == 0) {
+    return "chmod a+rx " + closed.path;
+  }
+  return "Put the file itself in place of the link: cp --remove-destination $(readlink -f " +
+         file.path + ") " + file.path;
 }
 
 // OIDCLogin reads the profile file without the guard, with the caller's own permissions.
@@ -129,13 +73,14 @@ void CheckProfileReader(Checkup& checkup, const File& file) {
   if (!reply.Threw("read profile file failed.")) return;
   const bool group =
       !checkup.caller && (file.status.st_mode & S_IRGRP) != 0 && file.status.st_gid != 0;
+  const auto closed = ClosedTo(caller, file.path, R_OK);
+  const Spot spot = closed ? *closed : Spot{file.path, file.status};
   checkup.report.Add(
       {"profile-private", group ? Grade::kWarning : Grade::kFailure,
        (checkup.caller ? "The user " + caller.name + " cannot read " : "Not every user can read ") +
-           std::string(file.kind.name) + " (mode " + Mode(file.status) +
-           ", or a folder above it is closed)",
+           std::string(file.kind.name) + ": " + spot.path + " is closed (" + spot.Owner() + ")",
        file.At(),
-       "chmod 0644 " + file.path +
+       Opening(file, spot) +
            (group ? ", or name the login program's user with --user to know." : ""),
        reply.said});
 }
@@ -151,6 +96,27 @@ void CheckFolder(Checkup& checkup) {
                           std::to_string(status.st_uid) + ", mode " + Mode(status) + ")",
                       {folder}, "chown root:root " + folder + "; chmod 0755 " + folder,
                       {Said::Does("does not check owner and mode")});
+}
+
+// Copies that editors and people leave behind.
+void CheckCopies(Checkup& checkup) {
+  std::error_code error;
+  for (const auto& entry : std::filesystem::directory_iterator(kFolder, error)) {
+    const std::string name = entry.path().filename();
+    Spot spot{entry.path()};
+    if (FindKind(name) != nullptr || lstat(spot.path.c_str(), &spot.status) != 0) continue;
+    const bool copy =
+        std::any_of(std::begin(kFileKinds), std::end(kFileKinds), [&name](const FileKind& kind) {
+          return kind.secret && name.find(kind.name) < 2 &&
+                 access((kFolder + std::string(kind.name)).c_str(), F_OK) == 0;
+        });
+    if (!copy || !S_ISREG(spot.status.st_mode) || (spot.status.st_mode & 044) == 0) continue;
+    const std::string shown = Shown(spot.path, 200);
+    checkup.report.Warn(
+        "secret-readable",
+        "Users other than root can read a copy of the settings (" + spot.Owner() + ")", {shown},
+        "rm '" + shown + "', and set a new client secret.");
+  }
 }
 
 // --- secrets
@@ -183,6 +149,7 @@ void HideSecrets(const FileKind& kind, const Json::Value& document) {
 
 void CheckFiles(Checkup& checkup) {
   CheckFolder(checkup);
+  CheckCopies(checkup);
   const File profile = Load(kFileKinds[0]);
   Json::Value document;
   if (CheckFile(checkup, profile, true, document)) {

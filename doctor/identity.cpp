@@ -1,12 +1,8 @@
 // The identity of the login program: the library's guard needs root as the real or saved id.
 #include <grp.h>
 #include <pwd.h>
-#include <sys/stat.h>
-#include <sys/statvfs.h>
 #include <unistd.h>
 
-#include <cerrno>
-#include <cstring>
 #include <stdexcept>
 
 #include "doctor/checkup.h"
@@ -16,6 +12,7 @@ namespace doctor {
 namespace {
 
 constexpr uid_t kNobody = 65534;
+constexpr char kUsualUser[] = "www-data";
 
 Caller UserByName(const std::string& name) {
   const struct passwd* const entry = getpwnam(name.c_str());
@@ -29,52 +26,23 @@ Caller UserByName(const std::string& name) {
   return caller;
 }
 
-// What keeps the program from having root as its saved id, if anything does.
-bool ProgramFault(const std::string& path, Finding& finding) {
-  const auto fault = [&](const char* id, const std::string& cause, const std::string& action) {
-    finding = {id, Grade::kFailure, "The login program " + cause, {path}, action};
-    return true;
-  };
-  struct stat status = {};
-  if (stat(path.c_str(), &status) != 0) {
-    return fault("program-missing", "cannot be found: " + std::string(std::strerror(errno)),
-                 "Name the installed login program.");
+// The guard's own error lines.
+std::vector<Said> GuardErrors(const Reply& reply) {
+  std::vector<Said> lines;
+  for (const Said& line : reply.ErrorLines()) {
+    if (line.text.compare(0, 7, "ERROR: ") == 0) lines.push_back(line);
   }
-  if (!S_ISREG(status.st_mode) || (status.st_mode & S_ISUID) == 0 || status.st_uid != 0) {
-    return fault(
-        "program-not-set-id", "is not set-user-id root, so it cannot read the settings",
-        "chown root:GROUP " + path + "; chmod 4750 " + path + " (GROUP: the web server's)");
-  }
-  struct statvfs system = {};
-  if (statvfs(path.c_str(), &system) == 0 && (system.f_flag & ST_NOSUID) != 0) {
-    return fault("program-nosuid", "is on a file system that is mounted nosuid",
-                 "Mount that file system without nosuid, or install the program on another.");
-  }
-  return false;
-}
-
-void CheckProgram(Checkup& checkup, Caller& caller) {
-  const std::string& path = checkup.options.program;
-  Finding finding;
-  if (ProgramFault(path, finding)) {
-    caller.saved_root = false;
-    finding.detail = checkup.library.Profile(&caller).ErrorLines();
-    checkup.report.Add(finding);
-    return;
-  }
-  struct stat status = {};
-  if (stat(path.c_str(), &status) == 0 && (status.st_mode & S_IXOTH) != 0) {
-    checkup.report.Warn("program-open",
-                        "The login program is set-user-id root and any user can start it", {path},
-                        "chmod 4750 " + path + ", with the web server's group as its group.");
-  }
+  return lines;
 }
 
 // Asks the library as the login program would. With root as saved identity it can only fail if
 // this command itself lacks a permission.
 void CheckGuard(Checkup& checkup, const Caller* caller, const std::string& who) {
   const Reply reply = checkup.library.Profile(caller);
-  if (reply.ended && reply.Thrown().empty() && reply.ErrorLines().empty()) {
+  if (!reply.ended && checkup.report.Has("file-unreadable")) {
+    return checkup.report.Skip("The identity of the login program", "file-unreadable");
+  }
+  if (reply.ended && reply.Thrown().empty() && GuardErrors(reply).empty()) {
     checkup.report.Good("identity", "The library can become root and back as " + who);
     return;
   }
@@ -85,8 +53,7 @@ void CheckGuard(Checkup& checkup, const Caller* caller, const std::string& who) 
 void CheckAsOther(Checkup& checkup) {
   Caller caller = checkup.caller ? *checkup.caller
                                  : Caller{"a user without permissions", kNobody, kNobody, {}, true};
-  if (!checkup.options.program.empty()) CheckProgram(checkup, caller);
-  if (!caller.saved_root) return;  // there is a finding
+  if (!checkup.options.program.empty() && !CheckProgram(checkup, caller)) return;
   CheckGuard(checkup, &caller,
              caller.name + (checkup.options.program.empty() ? " with root as saved identity"
                                                             : " in " + checkup.options.program));
@@ -94,7 +61,7 @@ void CheckAsOther(Checkup& checkup) {
 
 // Without root the doctor is one more caller, and not the login program.
 void CheckAsOurselves(Checkup& checkup) {
-  const std::vector<Said> errors = checkup.library.Profile().ErrorLines();
+  const std::vector<Said> errors = GuardErrors(checkup.library.Profile());
   if (errors.empty()) {
     checkup.report.Good("identity", "The library can become root in this command");
     return;
@@ -106,7 +73,10 @@ void CheckAsOurselves(Checkup& checkup) {
 }  // namespace
 
 void FindCaller(Checkup& checkup) {
-  if (!checkup.options.user.empty()) checkup.caller = UserByName(checkup.options.user);
+  const std::string& user = checkup.options.user;
+  if (!user.empty()) checkup.caller = UserByName(user);
+  const bool usual = user.empty() && !checkup.options.program.empty();
+  if (usual && getpwnam(kUsualUser) != nullptr) checkup.caller = UserByName(kUsualUser);
 }
 
 void CheckIdentity(Checkup& checkup) {

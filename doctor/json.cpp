@@ -8,8 +8,6 @@
 
 namespace doctor {
 
-namespace {
-
 std::string Position(const std::string& text, size_t offset) {
   const auto end = text.begin() + static_cast<std::ptrdiff_t>(std::min(offset, text.size()));
   const auto line = 1 + std::count(text.begin(), end, '\n');
@@ -17,8 +15,6 @@ std::string Position(const std::string& text, size_t offset) {
   const size_t column = start == std::string::npos || start >= offset ? offset : offset - start - 1;
   return "line " + std::to_string(line) + ", column " + std::to_string(column + 1);
 }
-
-}  // namespace
 
 // The newer reader takes other texts for JSON than the one in the library.
 #if defined(__GNUC__)
@@ -51,7 +47,7 @@ bool ParseJson(const std::string& text, Json::Value& value) {
   return ParseJson(text, value, problem);
 }
 
-std::string OddJson(const std::string& text) {
+OddJson FindOdd(const std::string& text) {
   const auto accepts = [&text](const char* rule) {
     Json::CharReaderBuilder builder;
     if (rule != nullptr) builder[rule] = true;
@@ -63,10 +59,8 @@ std::string OddJson(const std::string& text) {
       return false;
     }
   };
-  if (!accepts(nullptr)) return "";
-  if (!accepts("rejectDupKeys")) return "a key is given twice";
-  if (!accepts("failIfExtra")) return "there is text behind the closing brace";
-  return "";
+  if (!accepts(nullptr)) return {};
+  return {!accepts("failIfExtra"), !accepts("rejectDupKeys")};
 }
 
 std::string WriteJson(const Json::Value& value, JsonStyle style) {

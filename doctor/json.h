@@ -13,9 +13,15 @@ namespace doctor {
 bool ParseJson(const std::string& text, Json::Value& value, std::string& problem);
 bool ParseJson(const std::string& text, Json::Value& value);
 
-// What the library's reader lets pass, though it is hardly meant: text behind the document, a
-// member given twice. Empty if there is nothing of the kind.
-std::string OddJson(const std::string& text);
+// "line 2, column 5"
+std::string Position(const std::string& text, size_t offset);
+
+// What the library's reader lets pass, though it is hardly meant.
+struct OddJson {
+  bool text_behind = false;  // the document
+  bool key_twice = false;
+};
+OddJson FindOdd(const std::string& text);
 
 enum class JsonStyle { kCompact, kForPeople };
 // kForPeople escapes what is not ASCII; kCompact keeps all bytes as they are.

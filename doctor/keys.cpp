@@ -57,6 +57,13 @@ const FileKind kFileKinds[3] = {
       {"websphere_redirect_uri", Json::stringValue, true, kRedirect},
       {"websphere_logout_endpoint", Json::stringValue, false, kLogout}}}};
 
+const FileKind* FindKind(const std::string& name) {
+  for (const FileKind& kind : kFileKinds) {
+    if (name == kind.name) return &kind;
+  }
+  return nullptr;
+}
+
 const Key* FindKey(const FileKind& kind, const std::string& name) {
   for (const Key& key : kind.keys) {
     if (name == key.name) return &key;

@@ -27,6 +27,8 @@ struct FileKind {
 
 extern const FileKind kFileKinds[3];
 
+// The kind of a file of this name; null: none.
+const FileKind* FindKind(const std::string& name);
 const Key* FindKey(const FileKind& kind, const std::string& name);
 
 // What the library says and does in a login without this key.

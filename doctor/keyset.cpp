@@ -37,6 +37,7 @@ class KeySetCheck {
       return "";
     }
     AddGood();
+    if (checkup.entra() && uri.find('?') == std::string::npos) CheckOwnKeys(uri);
     return *usable.begin();
   }
 
@@ -105,6 +106,21 @@ class KeySetCheck {
                " bits",
            "accepts keys of any length", "Let the provider use RSA keys of 2048 bits or more.");
     }
+  }
+
+  // An application with its own signing keys has them in a key set of its own.
+  void CheckOwnKeys(const std::string& uri) {
+    const std::string query = "?appid=" + checkup.settings.client_id;
+    const Destination destination{"key set of the application", uri + query, Grade::kWarning, {}};
+    const WebAnswer answer = Send(checkup, destination);
+    Json::Value own;
+    if (answer.code != CURLE_OK || !ParseJson(answer.body, own) || KeysOf(own).empty()) return;
+    for (const Json::Value& key : KeysOf(own)) {
+      if (met.count(StringOf(key, "kid")) > 0) return;
+    }
+    checkup.report.Fail("keys-of-application",
+                        "The application has its own signing keys, which are not in this key set",
+                        place, "Append " + query + " to azure_wellknown.", Ask());
   }
 
   void AddGood() const {

@@ -23,11 +23,16 @@ struct Check {
 };
 
 // In the order of a sign-in.
-constexpr Check kChecks[] = {
-    {"Files", doctor::CheckFiles},       {"Identity", doctor::CheckIdentity},
-    {"Settings", doctor::CheckSettings}, {"Network", doctor::CheckEndpoints},
-    {"Clock", doctor::CheckClock},       {"User name", doctor::CheckName},
-    {"Token", doctor::CheckToken}};
+constexpr Check kChecks[] = {{"Files", doctor::CheckFiles},
+                             {"Login program", doctor::CheckLoginSettings},
+                             {"Identity", doctor::CheckIdentity},
+                             {"Login program", doctor::CheckStore},
+                             {"Settings", doctor::CheckSettings},
+                             {"Network", doctor::CheckEndpoints},
+                             {"Login program", doctor::CheckDeadline},
+                             {"Clock", doctor::CheckClock},
+                             {"User name", doctor::CheckName},
+                             {"Token", doctor::CheckToken}};
 
 // A check that ends early is a finding; the others still run.
 void Run(const Check& check, doctor::Checkup& checkup) {

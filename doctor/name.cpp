@@ -17,6 +17,7 @@ void AddRefused(Checkup& checkup, const Reply& reply, const std::string& shown) 
                   reply.said};
   if (!reply.ended) {
     finding.id = "name-silent";
+    if (!checkup.settings_read) finding.because = "file-unreadable";
     finding.cause = "The device's directory service did not answer within " +
                     std::to_string(checkup.options.timeout) + " s";
     finding.detail = {Said::Does("waits for it")};

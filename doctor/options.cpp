@@ -19,8 +19,8 @@ constexpr char kHelp[] =
     R"(Usage: ssoclient-doctor [OPTION]...
 Finds out why users cannot sign in to this device, and what to do about it. Run it as root.
 
-  --user NAME        the user that the login program runs as; checks with its permissions too
-  --program FILE     the login program; checks that it can read the settings
+  --user NAME        the user that the web server runs as (default with --program: www-data)
+  --program FILE     the login program; runs it as that user, with a request that changes nothing
   --name USER        converts the user name USER (account@dns.domain) as a sign-in does
   --token            reads an ID token from standard input and reports what each check says
   --try-secret       sends the client secret to the token endpoint, and reports if it is accepted

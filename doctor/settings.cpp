@@ -24,8 +24,10 @@ class EndpointCheck {
       : checkup(checked), endpoint(one), url(one.url), name(Quote(checked.Key(one.key))) {}
 
   void Run() {
-    if (endpoint.url.empty()) return;  // a finding about the file
     Hide(url.password());
+    if (endpoint.url.empty() || checkup.bad_keys.count(checkup.Key(endpoint.key)) > 0) {
+      return;  // a finding about the file
+    }
     if (HasSpaceAround(endpoint.url)) {
       return Fail("url-space", "has a blank at its beginning or end", "Remove the blank.");
     }
@@ -117,6 +119,7 @@ class EndpointCheck {
 
 void Warn(Checkup& checkup, const char* id, const std::string& key, const std::string& cause,
           const std::string& action, const std::vector<Said>& said, Grade grade = Grade::kWarning) {
+  if (checkup.bad_keys.count(checkup.Key(key)) > 0) return;  // a finding about the file
   checkup.report.Add(
       {id, grade, Quote(checkup.Key(key)) + " " + cause, checkup.At(key), action, said});
 }
@@ -197,8 +200,11 @@ void CheckSettings(Checkup& checkup) {
     EndpointCheck(checkup, endpoint).Run();
   }
   if (HasSpaceAround(settings.client_secret)) {
-    Warn(checkup, "secret-space", "client_secret", "has a blank or line break at an end",
-         "Remove it, unless the provider's secret has it.", {Said::Does("sends it unchanged")});
+    checkup.report.Fail(
+        "secret-space",
+        Quote(checkup.Key("client_secret")) + " has a blank or line break at an end",
+        checkup.At("client_secret"), "Remove it, unless the provider's secret has it.",
+        {Said::Does("sends it unchanged")});
   }
   if (checkup.azure()) CheckAzureValues(checkup);
   if (!checkup.azure() && !settings.client_secret.empty()) CheckWebSphereSecret(checkup);

@@ -19,21 +19,19 @@ constexpr std::array kExpected = {"AADSTS9002313", "AADSTS900144", "AADSTS90014"
                                   "AADSTS7000216", "AADSTS50012",  "AADSTS50089", "CWWKS1406E",
                                   "CWOAU0029E",    "CWOAU0033E",   "CWOAU0038E",  "CWOAU0058E"};
 
+// The resource of Entra ID that each tenant has, in each cloud.
+constexpr char kGraph[] = "00000003-0000-0000-c000-000000000000";
+
 bool IsExpected(const Refusal& refusal) {
   return refusal.code.empty() || refusal.plain ||
          std::find(kExpected.begin(), kExpected.end(), refusal.code) != kExpected.end();
-}
-
-std::string Fix(const Checkup& checkup) {
-  const std::string there = checkup.Documented("token_endpoint", checkup.settings.token_endpoint);
-  return "Set " + checkup.Key("token_endpoint") + " to " +
-         (there.empty() ? "the URL of the provider's token endpoint" : Shown(there, 200)) + ".";
 }
 
 // What is wrong with the answer; an empty id if nothing is.
 Finding Fault(const Checkup& checkup, const WebAnswer& answer, const Json::Value& document) {
   Finding finding{"", Grade::kFailure, ""};
   const Refusal refusal = RefusalIn(answer.body);
+  const std::string fix = checkup.Fix("token_endpoint", checkup.settings.token_endpoint);
   const auto is = [&](const char* id, const std::string& cause, const std::string& action) {
     finding.id = id;
     finding.cause = cause + " (" + Describe(answer) + ")";
@@ -55,16 +53,19 @@ Finding Fault(const Checkup& checkup, const WebAnswer& answer, const Json::Value
               "Check the provider and its log.");
   }
   if (answer.status == 404 || answer.status == 405 || answer.status == 410) {
-    return is("token-endpoint-wrong", "The server has no token endpoint at this URL", Fix(checkup));
+    return is("token-endpoint-wrong", "The server has no token endpoint at this URL", fix);
   }
+  // A refusal without a reason.
+  const bool refused = answer.status >= 400 && answer.status < 500;
+  if (refused && answer.body.empty()) return finding;
   if (!document.isObject()) {
-    if (answer.status == 400 || answer.status == 401) finding.grade = Grade::kWarning;
-    return is("token-endpoint-no-json", "The token endpoint does not answer in JSON", Fix(checkup));
+    if (refused) finding.grade = Grade::kWarning;
+    return is("token-endpoint-no-json", "The token endpoint does not answer in JSON", fix);
   }
   if (StringOf(document, "error").empty()) {
     finding.grade = Grade::kWarning;
     return is("token-endpoint-odd",
-              "The token endpoint does not refuse a false code with \"error\"", Fix(checkup));
+              "The token endpoint does not refuse a false code with \"error\"", fix);
   }
   return finding;
 }
@@ -88,10 +89,12 @@ std::string Without(const std::string& body, std::initializer_list<const char*> 
 
 // The grant that no user takes part in: what it answers is about client and secret alone.
 std::string ClientCredentials(const Checkup& checkup, const std::string& exchange) {
-  const bool v2 = ShapeOf(checkup.settings.token_endpoint).version == 2;
+  const int version = ShapeOf(checkup.settings.token_endpoint).version;
   return "grant_type=client_credentials&" +
          Without(exchange, {"grant_type", "code", "redirect_uri"}) +
-         (v2 ? "&scope=" + checkup.settings.client_id + "%2F.default" : "");
+         (version == 2   ? std::string("&scope=") + kGraph + "%2F.default"
+          : version == 1 ? std::string("&resource=") + kGraph
+                         : "");
 }
 
 // Why the secret must not be sent there; empty if it may.
@@ -180,7 +183,8 @@ void CheckTokenEndpoint(Checkup& checkup) {
   Destination endpoint{"token endpoint", checkup.settings.token_endpoint, Grade::kFailure,
                        [&] { return checkup.library.TokenRequest(body).said; }};
   if (checkup.IsWorthRequest(endpoint.url)) {
-    if (!checkup.Documented("token_endpoint", endpoint.url).empty()) endpoint.fix = Fix(checkup);
+    if (!checkup.Documented("token_endpoint", endpoint.url).empty())
+      endpoint.fix = checkup.Fix("token_endpoint", endpoint.url);
     WebAnswer answer;
     if (Exchange(checkup, endpoint, &body, answer)) {
       Json::Value document;

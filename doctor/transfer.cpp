@@ -150,7 +150,7 @@ class TransferReport {
     if (encrypted && !answer.encrypted) {
       cause = "The server did not finish the TLS handshake" + within;
     }
-    if (answer.address.empty()) cause = "There is no connection to " + host + within;
+    if (!answer.connected) cause = "There is no connection to " + host + within;
     Add("server-silent", destination.grave, cause,
         "Check the firewall and the provider; --timeout gives more time.",
         {Said::Does("sets no time-out: the login program must end a sign-in that takes too long")});

@@ -57,7 +57,7 @@ ParsedUrl::ParsedUrl(const std::string& url) {
 Shape ShapeOf(const std::string& url) {
   static const std::regex entra(
       "/([^/]+)/(?:oauth2/(v2\\.0/)?(?:authorize|token|logout|devicecode)|"
-      "(v2\\.0/)?\\.well-known/openid-configuration|discovery/(v2\\.0/)?keys)/?",
+      "(v2\\.0/)?\\.well-known/openid-configuration|discovery/(v2\\.0/)?keys)",
       std::regex::icase);
   const std::string path = ParsedUrl(url).path();
   Shape shape;

@@ -1,5 +1,6 @@
 #include "doctor/web.h"
 
+#include <netdb.h>
 #include <openssl/ssl.h>
 #include <openssl/x509v3.h>
 
@@ -157,9 +158,27 @@ void Inspect(CURL* handle, WebAnswer& answer) {
   curl_off_t microseconds = 0;
   curl_easy_getinfo(handle, CURLINFO_TOTAL_TIME_T, &microseconds);
   answer.milliseconds = static_cast<long>(microseconds / 1000);
+  answer.connected = Happened(handle, CURLINFO_CONNECT_TIME_T);
   answer.encrypted = Happened(handle, CURLINFO_APPCONNECT_TIME_T);
   answer.location = Text(handle, CURLINFO_REDIRECT_URL);
   answer.type = Text(handle, CURLINFO_CONTENT_TYPE);
+}
+
+// The IP addresses of a host, separated by blanks.
+std::string AddressesOf(const std::string& host) {
+  struct addrinfo hints = {};
+  hints.ai_socktype = SOCK_STREAM;
+  struct addrinfo* found = nullptr;
+  if (host.empty() || getaddrinfo(host.c_str(), nullptr, &hints, &found) != 0) return "";
+  const std::unique_ptr<struct addrinfo, Deleter<freeaddrinfo>> owner(found);
+  std::string all;
+  for (const struct addrinfo* one = found; one != nullptr; one = one->ai_next) {
+    char text[NI_MAXHOST];
+    if (getnameinfo(one->ai_addr, one->ai_addrlen, text, sizeof text, nullptr, 0, NI_NUMERICHOST) ==
+        0)
+      all += (all.empty() ? "" : " ") + std::string(text);
+  }
+  return all;
 }
 
 }  // namespace
@@ -195,6 +214,9 @@ WebAnswer Fetch(const std::string& url, const std::string* body, int seconds, bo
   answer.received = time(nullptr);
   answer.detail = error[0] != '\0' ? error : curl_easy_strerror(answer.code);
   Inspect(handle, answer);
+  if (!answer.connected && answer.address.empty() && (lenient || ProxyFor(url).empty())) {
+    answer.address = AddressesOf(transfer.host);
+  }
   return answer;
 }
 

@@ -31,7 +31,8 @@ struct WebAnswer {
   size_t verify_depth = 0;
   bool names_host = true;  // the first certificate is for the host of the URL
 
-  std::string address;  // the IP address of the other end
+  bool connected = false;
+  std::string address;  // the IP address of the other end, or those that were tried
   long milliseconds = 0;
   long status = 0;          // HTTP
   std::string location;     // of a redirect

@@ -131,7 +131,7 @@ void AzureSSOClient::RequestKeysInfo(std::string uri, Json::Value& keys) {
     keys.swap(document);
     if (FindMember(keys, "keys") == nullptr) throw std::invalid_argument("no kyes information");
   } catch (const std::bad_alloc&) {
-    syslog(LOG_ERR, "%s:%d curl_easy_init failed. %m", kUnit, __LINE__);
+    __extension__ syslog(LOG_ERR, "%s:%d curl_easy_init failed. %m", kUnit, __LINE__);
   } catch (const std::invalid_argument& e) {
     syslog(LOG_ERR, "%s:%d %s", kUnit, __LINE__, e.what());
   } catch (const sso_err_resp& e) {

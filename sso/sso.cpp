@@ -113,7 +113,7 @@ void SSOClient::RequestWellknownInfo(Json::Value& out) {
     httpGet(wellknownEndpoint, response, true, WriteToStringCallback);
     if (!ParseJson(response, out)) throw sso_err_resp("bad wellknown json format.");
   } catch (const std::bad_alloc&) {
-    syslog(LOG_ERR, "%s:%d bad_alloc. %m", kUnit, __LINE__);
+    __extension__ syslog(LOG_ERR, "%s:%d bad_alloc. %m", kUnit, __LINE__);
   } catch (const std::invalid_argument& e) {
     syslog(LOG_ERR, "%s:%d %s", kUnit, __LINE__, e.what());
   } catch (const sso_err_resp& e) {
@@ -125,7 +125,7 @@ void SSOClient::RequestTokenEndpoint(std::string& response, const std::string& p
   try {
     httpPost(tokenEndpoint, params, response, true, WriteToStringCallback);
   } catch (const std::bad_alloc&) {
-    syslog(LOG_ERR, "%s:%d bad_alloc. %m", kUnit, __LINE__);
+    __extension__ syslog(LOG_ERR, "%s:%d bad_alloc. %m", kUnit, __LINE__);
   } catch (const std::invalid_argument& e) {
     syslog(LOG_ERR, "%s:%d %s", kUnit, __LINE__, e.what());
   } catch (const sso_err_resp& e) {

@@ -85,12 +85,12 @@ std::string MD5Digest(std::string text) {
   std::string result;
   unsigned char digest[MD5_DIGEST_LENGTH];
   if (MD5(reinterpret_cast<const unsigned char*>(text.data()), text.size(), digest) == nullptr) {
-    syslog(LOG_ERR, "%s:%d MD5 digest failed %m", kUnit, __LINE__);
+    __extension__ syslog(LOG_ERR, "%s:%d MD5 digest failed %m", kUnit, __LINE__);
     return result;
   }
   const CText hex(static_cast<char*>(std::calloc(2 * sizeof digest + 1, 1)));
   if (hex == nullptr) {
-    syslog(LOG_ERR, "%s:%d calloc failed. %m", kUnit, __LINE__);
+    __extension__ syslog(LOG_ERR, "%s:%d calloc failed. %m", kUnit, __LINE__);
     return result;
   }
   char* out = hex.get();

@@ -126,7 +126,7 @@ class Glewlwyd:
         return self._administrator.call(method, f"{self.url}/api/{path}", value)
 
     def _take_over(self):
-        """The packaged database has a known administrator: gives it a password of its own."""
+        """The packaged database has a known administrator: gives it its own password."""
         self._administrator = Browser(self._stage.authority)
         self._api("POST", "auth/", {"username": "admin", "password": "password"})
         self._api("PUT", "profile/password", {"old_password": "password",

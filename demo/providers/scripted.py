@@ -1,4 +1,4 @@
-"""A provider that does what a script tells it: what a certified provider refuses to show.
+"""A provider that follows a script: what a certified provider refuses to show.
 
 Without a script it behaves: a login form, codes that serve once, RS256 with a published key for
 the Azure client, HS256 under the client's secret for the WebSphere client. A script changes

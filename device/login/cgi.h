@@ -45,8 +45,8 @@ std::string Value(const Values& values, const std::string& name);
 std::string Cookie(const std::string& name, const std::string& value, int seconds = 0);
 
 // Redirect sends the browser to `location`. Throws std::invalid_argument, before anything is
-// written, if a cookie or the location holds a control character: a line break would start a
-// header of its own.
+// written, if a cookie or the location holds a control character: a line break would begin
+// another header.
 void Redirect(const std::string& location, const std::vector<std::string>& cookies);
 
 // Page sends a page that no other site can show in a frame, and that runs no scripts. `headers`

@@ -23,6 +23,11 @@ namespace {
 
 constexpr int kFirstDeadline = 30;         // until the settings are read
 constexpr rlim_t kChildMemory = 64 << 20;  // beyond what it has when it starts
+#ifdef __SANITIZE_ADDRESS__  // whose shadow takes terabytes
+constexpr bool kLimitMemory = false;
+#else
+constexpr bool kLimitMemory = true;
+#endif
 constexpr rlim_t kChildFile = 1 << 20;
 
 volatile sig_atomic_t answered = 0;
@@ -62,7 +67,7 @@ void CloseOneByOne() {
   }
 }
 
-// Descriptors 0 to 2 are open, all others closed: what the program opens gets a number of its own.
+// Descriptors 0 to 2 are open, all others closed: no file of the program gets a standard number.
 void ResetDescriptors() {
   int file = open("/dev/null", O_RDWR);
   while (file >= 0 && file <= STDERR_FILENO) file = open("/dev/null", O_RDWR);
@@ -137,10 +142,7 @@ void Confine(pid_t parent, int seconds) {
   alarm(static_cast<unsigned>(seconds) + 1);
   Limit(RLIMIT_CPU, static_cast<rlim_t>(seconds));
   Limit(RLIMIT_FSIZE, kChildFile);
-#ifndef __SANITIZE_ADDRESS__  // whose shadow takes terabytes
-  const rlim_t used = AddressSpace();
-  Limit(RLIMIT_AS, used + kChildMemory);
-#endif
+  if (kLimitMemory) Limit(RLIMIT_AS, AddressSpace() + kChildMemory);
   DieWithParent(parent);
 }
 

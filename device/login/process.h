@@ -33,8 +33,8 @@ void Confine(pid_t parent, int seconds);
 // DieWithParent is the last part of Confine. Each change of ids undoes it.
 void DieWithParent(pid_t parent);
 
-// SetProxy tells libcurl of the proxy in the settings: there is no other way from outside the
-// library than the process's own environment.
+// SetProxy passes the proxy of the settings to libcurl. Its only way in from outside the library is
+// the environment, which holds nothing else by then.
 void SetProxy(const Settings& settings);
 
 }  // namespace process

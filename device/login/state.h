@@ -11,6 +11,6 @@ Json::Value DecodeState(const std::string& state);
 // Member returns a member of an object as text, empty if it is missing or no string.
 std::string Member(const Json::Value& object, const std::string& name);
 
-// IsOwnPath tells whether a text is the path of a page of this very site: anything else could
+// IsOwnPath says whether a text is the path of a page of this very site: anything else could
 // lead the browser elsewhere.
 bool IsOwnPath(const std::string& text);

@@ -1,6 +1,6 @@
 /* A plugin for QEMU's user emulation: counts the instructions of an emulated program, and writes
  * the sum to a file when it ends. qemu-arm -plugin COUNTER,out=FILE PROGRAM ARGUMENT... Debian's
- * QEMU loads plugins, but comes without their header: what is needed of it stands here (QEMU's
+ * QEMU loads plugins, but comes without their header: what is needed of it is here (QEMU's
  * interface for plugins, version 1). */
 #include <inttypes.h>
 #include <stddef.h>

@@ -1,4 +1,4 @@
-// The same work written by hand on the same libraries: the steps that have to be made, in order,
+// The same work hand-written on the same libraries: the steps that have to be made, in order,
 // and nothing between them. No check of what cannot fail here, no exception, no log line.
 #define OPENSSL_API_COMPAT 0x10100000L
 

@@ -3,7 +3,7 @@
 // kilobytes. Each runs twice and the second run counts: what ran before it is then the same for
 // all.
 //   bench_process ROUNDS -- PROGRAM ARGUMENT... [-- PROGRAM ARGUMENT...]...
-// A small program of its own: the peak that the kernel tells of a child begins with its parent's.
+// A separate small program: the peak that the kernel reports for a child begins with its parent's.
 #include <fcntl.h>
 #include <spawn.h>
 #include <sys/resource.h>

@@ -118,7 +118,7 @@ def write(found):
              "## Other libraries",
              "How much of this library's time another takes (in brackets: instructions). Its "
              "shortest way each: libjwt has one call for everything and takes the key as PEM. Not "
-             "all do the same: cjose decodes with code of its own, not through OpenSSL's filters. "
+             "all do the same: cjose decodes with its own code, not through OpenSSL's filters. "
              "By hand is as above: no limit below it can be kept.",
              peer_table(found.peers),
              "## Programs that make no request",

@@ -1,5 +1,5 @@
-// What is measured: each piece of work, and the sizes for which its cost is told. library.cpp and
-// floor.cpp say how each is done.
+// What is measured: each piece of work, and the sizes for which its cost is reported. library.cpp
+// and floor.cpp say how each is done.
 #pragma once
 
 #include <openssl/evp.h>

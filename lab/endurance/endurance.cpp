@@ -1,7 +1,7 @@
 // Many whole logins against a provider on loopback, and what they leave behind in the process.
 //
 //   endurance azure|websphere LOGINS [tls] [name]    in one process
-//   endurance azure|websphere LOGINS processes       each in a process of its own
+//   endurance azure|websphere LOGINS processes       each in its own process
 //   endurance azure|websphere LOGINS DEFECT          must fail: shows that the check sees it
 //   endurance azure|websphere LOGINS processes DEFECT
 // DEFECT is what each login leaves behind: leak, open, thread, child; or lose, for valgrind.
@@ -60,7 +60,7 @@ void require(bool good, const std::string& what) {
   if (!good) throw std::runtime_error(what);
 }
 
-// The provider: fixed answers by path, one connection at a time, in a process of its own.
+// The provider: fixed answers by path, one connection at a time, in its own process.
 class Provider {
  public:
   Provider(bool tls, const test::Ca& authority) {
@@ -201,7 +201,7 @@ Sample look(pid_t client, long logins, long threads) {
     if (line.rfind("VmRSS:", 0) == 0) sample.rssKb = std::stol(line.substr(6));
   }
   std::ifstream children(folder + "task/" + std::to_string(client) + "/children");
-  require(children.is_open(), "the kernel does not tell the children of a process");
+  require(children.is_open(), "the kernel does not list the children of a process");
   for (pid_t child; children >> child;) ++sample.children;
   return sample;
 }
@@ -297,7 +297,7 @@ bool inOneProcess(const std::string& client, long logins, const std::string& def
   return isFlat(samples, lookups);
 }
 
-// Each login in a process of its own, four at a time.
+// Each login in its own process, four at a time.
 bool inManyProcesses(const std::string& client, long logins, const std::string& defect) {
   std::vector<long> sizes;
   long failed = 0;

@@ -54,7 +54,7 @@ bool startsWith(const std::string& text, const char* start) {
   return text.compare(0, std::strlen(start), start) == 0;
 }
 
-// These can not fail, or their failure has no effect, or it is want of memory and comes from an
+// These cannot fail, or their failure has no effect, or is out of memory and comes from an
 // allocation, which is counted by itself.
 const char* const kCanNotFail[] = {
     // constants and look-ups in what exists
@@ -73,7 +73,7 @@ const char* const kCanNotFail[] = {
     // libcurl is in the program already when it is looked for
     "dlopen", "dlsym", "dlerror"};
 
-// The C++ run time and jsoncpp fail for want of memory alone.
+// The C++ run time and jsoncpp fail only when memory runs out.
 const char* const kRunTimes[] = {"_ZNSt",    "_ZNSa",     "__aeabi_", "_ZNKSt", "_ZNSi",  "_ZNSo",
                                  "_ZSt",     "_ZTI",      "_ZTT",     "_ZTV",   "_ZTS",   "_ZdaPv",
                                  "_ZdlPv",   "__cxa_",    "__gxx_",   "_ITM_",  "__gmon", "__gcov_",

@@ -17,7 +17,7 @@ struct Compared {
 Compared compareExports(const std::set<std::string>& operations);
 
 // The imported functions; missing are those that the driver does not make fail and that are not
-// known to be unable to, or to fail for want of memory alone.
+// known to be unable to, or to fail only when memory runs out.
 Compared compareImports();
 
 }  // namespace faults

@@ -174,7 +174,7 @@ bool failsFor(const void* caller, const char* name) {
   return isLibrary(caller) && fails(Kind::kCall, name);
 }
 
-// The functions below and what stands behind them, looked up before the first run.
+// The functions below and what is behind them, looked up before the first run.
 struct Behind {
   const char* name;
   void** address;
@@ -202,7 +202,7 @@ struct Registered {
   }                                                                          \
   static_assert(true, "takes a semicolon")
 
-// FAULTY(RESULT, NAME, PARAMETERS, ARGUMENTS, FAILED): stands before the function of that name.
+// FAULTY(RESULT, NAME, PARAMETERS, ARGUMENTS, FAILED): comes before the function of that name.
 #define FAULTY(RESULT, NAME, PARAMETERS, ARGUMENTS, FAILED) \
   BEHIND(NAME);                                             \
   SPY RESULT NAME PARAMETERS {                              \
@@ -217,7 +217,7 @@ FAULTY(unsigned char*, MD5, (const unsigned char* text, std::size_t length, unsi
 FAULTY(long, BIO_ctrl, (BIO * bio, int command, long number, void* argument),
        (bio, command, number, argument), -1)
 
-// As libcurl does when its parts are not to be had: nothing is set up.
+// As libcurl does when its parts cannot be loaded: nothing is set up.
 FAULTY(CURLcode, curl_global_init, (long flags), (flags), CURLE_FAILED_INIT)
 FAULTY(CURL*, curl_easy_init, (), (), (errno = ENOMEM, nullptr))
 FAULTY(CURLcode, curl_easy_perform, (CURL * handle), (handle), CURLE_OUT_OF_MEMORY)

@@ -55,7 +55,7 @@ bool canFail(const std::string& function);
 // The file name of the library under test, as it was loaded.
 std::string libraryFile();
 
-// Looks up everything that stands behind the functions here; before anything else.
+// Looks up everything that comes behind the functions here; before anything else.
 void prepare();
 
 }  // namespace faults

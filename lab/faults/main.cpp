@@ -1,11 +1,11 @@
 // Runs every operation of the library with each allocation, and each call that can fail, failing
-// once: alone, and with all that follow. After each run: the outcome is one of those laid down,
+// once: alone, and with all that follow. After each run: the outcome is one of those expected,
 // nothing was kept (memory, descriptors), the process ids are what the guard leaves, and the
 // system log holds the library's own lines alone. Operations are run in processes of their own.
 //   fault_test [--every N] [--fresh N] [--measured] [NAME...]
 // NAME limits it to operations that begin so; --every N takes every N-th allocation of those that
 // talk TLS, --fresh N of those in fresh processes. --measured: the library carries a run time of
-// the compiler's that measures, with imports of its own.
+// the compiler's that measures, with its own imports.
 #include <curl/curl.h>
 #include <cxxabi.h>
 #include <dirent.h>
@@ -84,7 +84,7 @@ std::string textOf(const Plan& plan, const char* name) {
          std::to_string(plan.nth) + (plan.allAfter ? " and all after it" : "") + " (" + name + ")";
 }
 
-// The outcome is laid down for the function that failed; when more than one kind of function
+// The outcome is expected for the function that failed; when more than one kind of function
 // failed, for any of them.
 bool isLaidDown(const Operation& operation, const Plan& plan, const Seen& what,
                 const std::string& outcome) {

@@ -48,22 +48,22 @@ class Run {
 using Outcomes = std::vector<std::string>;  // a "*" at the end stands for anything
 
 struct Operation {
-  // What is called, as the library's headers name it, and perhaps ", " and which road it takes.
+  // What is called, as the library's headers name it, and perhaps ", " and which variant it takes.
   std::string name;
   std::string good;  // the outcome when nothing fails
   // The outcomes when that function fails; "memory" stands for any allocation, "several" for
   // functions that fail together, and a "+" behind a name for that function with all that follow.
-  // Not listed: the outcome is the good one; for want of memory it may always be std::bad_alloc.
+  // Not listed: the outcome is the good one; when memory runs out it may always be std::bad_alloc.
   std::map<std::string, Outcomes> on;
   std::function<void(Run&)> body;
   std::function<void()> configure = nullptr;  // as root, before anything else; may be missing
-  // kStranger: over TLS, with a certificate of its own for another name.
+  // kStranger: over TLS, with its own certificate for another name.
   enum class Server { kNone, kPlain, kTls, kStranger } server = Server::kNone;
   bool cold = false;   // also in processes that have done nothing before
   bool quiet = false;  // nothing is logged: that is for its callers
 };
 
-// What the operations work with. Made in a process of its own, so that the libraries have done
+// What the operations work with. Made in its own process, so that the libraries have done
 // nothing yet where the operations run.
 struct Fixtures {
   std::map<std::string, std::string> texts;

@@ -1,4 +1,4 @@
-// Every exported operation of the library, on the roads that it can take.
+// Every exported operation of the library, on the paths that it can take.
 #include <curl/curl.h>
 #include <json/json.h>
 #include <openssl/evp.h>
@@ -270,7 +270,7 @@ Json::Value parameters() {
   return value;
 }
 
-// --- the roads
+// --- the paths
 
 struct Azure {
   using Client = AzureSSOClient;
@@ -380,10 +380,10 @@ void addRequests(std::vector<Operation>* all) {
 }
 
 template <typename Provider>
-void addResponse(std::vector<Operation>* all, const std::string& road, const std::string& response,
-                 const std::string& good, const std::string& token) {
+void addResponse(std::vector<Operation>* all, const std::string& variant,
+                 const std::string& response, const std::string& good, const std::string& token) {
   using Client = typename Provider::Client;
-  all->push_back({Provider::name() + "::ProcessTokenResponse" + road,
+  all->push_back({Provider::name() + "::ProcessTokenResponse" + variant,
                   good,
                   {{"memory", {kBadResponse}}},
                   [response, token](Run& run) {
@@ -415,21 +415,22 @@ Operation onToken(const std::string& operation, const std::string& token, const 
 }
 
 template <typename Provider>
-Operation userName(const std::string& road, const std::string& token, const std::string& good,
+Operation userName(const std::string& variant, const std::string& token, const std::string& good,
                    const Failures& failures) {
-  return onToken<Provider>("GetUserName" + road, token, good, failures, [](Run& run, auto& client) {
-    std::string user = "before";
-    run.armed([&] { client.GetUserName(user); });
-    if (run.returned()) run.gave(user);
-    run.expect(run.returned() || user == "before" || user == Provider::user(),
-               "a failure leaves the user as it was, or as the platform was asked");
-  });
+  return onToken<Provider>(
+      "GetUserName" + variant, token, good, failures, [](Run& run, auto& client) {
+        std::string user = "before";
+        run.armed([&] { client.GetUserName(user); });
+        if (run.returned()) run.gave(user);
+        run.expect(run.returned() || user == "before" || user == Provider::user(),
+                   "a failure leaves the user as it was, or as the platform was asked");
+      });
 }
 
 template <typename Provider>
-Operation userInfo(const std::string& road, const std::string& token, const std::string& good) {
+Operation userInfo(const std::string& variant, const std::string& token, const std::string& good) {
   return onToken<Provider>(
-      "GetUserInfo" + road, token, good, decoding(kBadBody), [](Run& run, auto& client) {
+      "GetUserInfo" + variant, token, good, decoding(kBadBody), [](Run& run, auto& client) {
         Json::Value info = "before";
         run.armed([&] { client.GetUserInfo(info); });
         if (run.returned()) run.gave(info["aud"].asString());
@@ -438,10 +439,10 @@ Operation userInfo(const std::string& road, const std::string& token, const std:
 }
 
 template <typename Provider>
-Operation verification(const std::string& road, const std::string& token, const std::string& good,
-                       const Failures& failures, bool cold = false) {
+Operation verification(const std::string& variant, const std::string& token,
+                       const std::string& good, const Failures& failures, bool cold = false) {
   Operation operation =
-      onToken<Provider>("VerifyIDToken" + road, token, good, failures,
+      onToken<Provider>("VerifyIDToken" + variant, token, good, failures,
                         [](Run& run, auto& client) { run.armed([&] { client.VerifyIDToken(); }); });
   operation.cold = cold;
   return operation;
@@ -487,11 +488,11 @@ void addAzure(std::vector<Operation>* all) {
 
   const Failures segments = decoding(kBadHeader) + decoding(kBadBody);
   const Failures keys = segments + transfer({kNoKey});
-  const auto add = [&](const std::string& road, const std::string& token, const std::string& good,
-                       const Failures& failures, Server server,
+  const auto add = [&](const std::string& variant, const std::string& token,
+                       const std::string& good, const Failures& failures, Server server,
                        const std::function<void()>& file = configureAzure) {
-    Operation operation =
-        verification<Azure>(road, token, good, failures, server != Server::kNone && road.empty());
+    Operation operation = verification<Azure>(variant, token, good, failures,
+                                              server != Server::kNone && variant.empty());
     operation.server = server;
     operation.configure = file;
     all->push_back(operation);
@@ -515,9 +516,9 @@ void addAzure(std::vector<Operation>* all) {
   add(", another tenant", fixtures()["another tenant token"],
       "std::invalid_argument: tenant ID invalid", segments, Server::kNone);
 
-  const auto keySet = [&](const std::string& road, const std::string& path, const std::string& good,
-                          const Failures& failures, Server server) {
-    all->push_back({"AzureSSOClient::RequestKeysInfo" + road, good, failures,
+  const auto keySet = [&](const std::string& variant, const std::string& path,
+                          const std::string& good, const Failures& failures, Server server) {
+    all->push_back({"AzureSSOClient::RequestKeysInfo" + variant, good, failures,
                     [path](Run& run) {
                       AzureSSOClient client;
                       Json::Value set = "before";
@@ -786,7 +787,7 @@ void addTransfers(std::vector<Operation>* all) {
                              {"curl_easy_perform+", no_memory}};
   const std::string got = "before plain text of some length";
   const std::string posted = "before plain text about what was posted";
-  const auto add = [&](const std::string& road, Server server, bool verify, bool post,
+  const auto add = [&](const std::string& variant, Server server, bool verify, bool post,
                        const Failures& more) {
     const bool refused = server == Server::kNone;
     const std::string whole = post ? posted : got;
@@ -803,10 +804,10 @@ void addTransfers(std::vector<Operation>* all) {
                                           (run.returned() && response == got)),
                  "the response keeps what it held, and what arrived");
     };
-    Operation operation = {(post ? "httpPost" : "httpGet") + road,
+    Operation operation = {(post ? "httpPost" : "httpGet") + variant,
                            refused ? kRefused : "ok: " + whole, failures + more, body};
     operation.server = server;
-    operation.cold = !post && (server == Server::kTls || (!refused && road.empty()));
+    operation.cold = !post && (server == Server::kTls || (!refused && variant.empty()));
     operation.quiet = true;
     all->push_back(operation);
   };
@@ -827,11 +828,11 @@ void addTransfers(std::vector<Operation>* all) {
 }
 
 void addProviderRequests(std::vector<Operation>* all) {
-  const auto discover = [&](const std::string& road, const Failures& failures,
+  const auto discover = [&](const std::string& variant, const Failures& failures,
                             const std::string& good, Server server,
                             const std::function<void()>& file) {
     all->push_back(
-        {"SSOClient::RequestWellknownInfo" + road, good, failures,
+        {"SSOClient::RequestWellknownInfo" + variant, good, failures,
          [](Run& run) {
            AzureSSOClient client;
            const std::string before = textOf(client);
@@ -857,8 +858,8 @@ void addProviderRequests(std::vector<Operation>* all) {
   discover(", not JSON", transfer({"ok: before"}), "ok: before", Server::kPlain,
            configureTextForDiscovery);
 
-  const auto exchange = [&](const std::string& road, const std::string& good, Server server) {
-    all->push_back({"SSOClient::RequestTokenEndpoint" + road, good,
+  const auto exchange = [&](const std::string& variant, const std::string& good, Server server) {
+    all->push_back({"SSOClient::RequestTokenEndpoint" + variant, good,
                     transfer({"ok: before "}) +
                         Failures{{"curl_easy_setopt POSTFIELDS", {"ok: before not posted", good}}},
                     [](Run& run) {
@@ -908,9 +909,9 @@ void addLogins(std::vector<Operation>* all) {
     run.expect(run.returned() || user == "before" || (asked && user == Azure::user()),
                "a failure leaves the user as it was, or as the platform was asked");
   };
-  const auto add = [&](const std::string& road, const std::string& good, const Failures& failures,
-                       const std::function<void()>& file, Server server) {
-    all->push_back({"OIDCLogin" + road, good, profile + failures, login, file, server,
+  const auto add = [&](const std::string& variant, const std::string& good,
+                       const Failures& failures, const std::function<void()>& file, Server server) {
+    all->push_back({"OIDCLogin" + variant, good, profile + failures, login, file, server,
                     server == Server::kPlain && good.compare(0, 2, "ok") == 0});
   };
   add(", Azure", "ok: " + Azure::user(), azure, configureAzure, Server::kPlain);
@@ -1084,9 +1085,9 @@ void addProfile(std::vector<Operation>* all) {
     run.gave((profile->SSOIsEnable() ? "on " : "off ") + profile->GetSSOProfile() + ", " +
              kindOf(*profile->GetSSOClient()));
   };
-  const auto add = [&](const std::string& road, const std::string& good, const Failures& failures,
-                       const std::function<void()>& file) {
-    all->push_back({"SSOProfile::SSOProfile" + road, good, failures, construct, file});
+  const auto add = [&](const std::string& variant, const std::string& good,
+                       const Failures& failures, const std::function<void()>& file) {
+    all->push_back({"SSOProfile::SSOProfile" + variant, good, failures, construct, file});
   };
   const std::string off = "ok: off , nothing";
   add(", Azure", "ok: on azure, all settings",

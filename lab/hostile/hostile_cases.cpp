@@ -594,7 +594,7 @@ const std::vector<Recipe> kDocuments = {
                             R"({"id_token\u0000":"a.b.c"})"}));
        m.end({kNoIdToken});
      }},
-    {"a token that is no text",
+    {"a token that is not a string",
      [](Maker& m) {
        m.forToken();
        m.give("{\"id_token\":" + oddValue(m.random) + "}");
@@ -636,7 +636,7 @@ const std::vector<Recipe> kDocuments = {
                             R"({"error":"x"})", R"({"jwks_uri":"\u0000"})"}));
        m.end({kNoKey});
      }},
-    {"an address that is no text",
+    {"an address that is not a string",
      [](Maker& m) {
        m.forAzure(kDiscovery);
        m.give(m.random.one({R"({"jwks_uri":[]})", R"({"jwks_uri":{}})", R"({"jwks_uri":["x"]})",
@@ -707,7 +707,7 @@ const std::vector<Recipe> kDocuments = {
        m.give(m.keySet(m.world.key.jwk(kid)));
        m.end({kNoKey});
      }},
-    {"a key whose name is no text",
+    {"a key whose name is not a string",
      [](Maker& m) {
        m.forAzure(kKeys);
        m.give(m.keySet("{\"kid\":" + m.random.one({"[]", "{}", "[\"the key\"]"}) + "}," +
@@ -851,7 +851,7 @@ const std::vector<Recipe> kTokens = {
                                                       "\"common\"", "\"the device\""}))));
        m.end({kOtherTenant});
      }},
-    {"claims that are no text",
+    {"claims that are not strings",
      [](Maker& m) {
        const std::string odd = m.random.one({"[]", "{}", "[\"the device\"]", "{\"a\":1}"});
        m.giveToken(m.sign(m.goodHeader(), m.random.maybe() ? Maker::claims(odd)
@@ -951,7 +951,7 @@ const std::vector<Recipe> kTokens = {
                                                         "{\"a\":\"\\udc00\\ud800", "\x01{}"})));
        m.end({kBadBody});
      }},
-    {"a body that is no object",
+    {"a body that is not an object",
      [](Maker& m) {
        m.giveToken(m.sign(m.goodHeader(), m.random.one({"null", "5", "[]", "\"exp\"", "true"})));
        m.end({kExpired});

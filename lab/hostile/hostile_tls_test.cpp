@@ -55,7 +55,7 @@ bool isMeasured() {
   return !kSanitized && (preloaded == nullptr || std::strstr(preloaded, "vgpreload") == nullptr);
 }
 
-// The most memory that a login took in a process of its own, in megabytes, less what it had.
+// The most memory that a login took in its own process, in megabytes, less what it had.
 size_t memoryOf(const std::function<void()>& login) {
   int ends[2];
   EXPECT_EQ(pipe(ends), 0);

@@ -77,7 +77,7 @@ class Scenario(DeviceTest):
         self.tab.wait(lambda: self.tab.url == url, url)
 
     def user_shown(self):
-        """Who the device says is signed in, on its front page; None if nobody is."""
+        """Who the device says is signed in, on its front page; None if no user is."""
         self.tab.open(self.device.front_url)
         self.tab.find("main")
         return None if self.tab.all("#sign-in") else self.tab.find("#user").text

@@ -1,4 +1,4 @@
-"""Every page for everybody: by keyboard, on a phone, in the dark, with large text, to the right."""
+"""Every page for everyone: by keyboard, on a phone, in the dark, with large text, to the right."""
 
 import os
 import secrets

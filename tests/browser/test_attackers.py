@@ -17,7 +17,7 @@ FOREIGN = ("https://evil.localhost/", "//evil.localhost/", "/\\evil.localhost",
 
 
 class Callbacks(Scenario):
-    """The attacker has a browser of his own (self.browser), and sends links."""
+    """The attacker has his own browser (self.browser), and sends links."""
 
     def forged(self, profile):
         self.device.choose(profile)
@@ -223,7 +223,7 @@ class Links(Scenario):
         self.assertNotIn("/image.png", [path for _, path, _, _ in self.device.provider.seen])
 
     def test_no_frame(self):
-        """Nobody lays a page of the device under a page of his own."""
+        """Nobody lays a page of the device under his own page."""
         self.tab.open(self.device.provider.url + "/websphere/logout")
         self.tab.script("""
             const frame = document.createElement("iframe");

@@ -121,7 +121,7 @@ class AtThePage(Scenario):
             self.assertNotIn("Signed in as", self.tab.text)
 
     def test_two_tabs(self):
-        """Each login has a cookie of its own: both sign in, in the other order."""
+        """Each login has its own cookie: both sign in, in the other order."""
         self.to_provider("websphere")
         first = self.tab.driver.current_window_handle
         self.tab.find("#password")

@@ -117,7 +117,7 @@ class Secrets(Scenario):
         self.assert_refused_here("not-verified", "verify hmac signature failed")
 
     def test_hmac_under_the_published_key(self):
-        """The forger takes what everybody can read as the secret of an HMAC."""
+        """The forger takes what everyone can read as the secret of an HMAC."""
         published = json.dumps(self.device.provider.document("azure", "keys")[2]).encode()
         self.device.provider.script = Script(
             header=lambda given: {**given, "alg": "HS256"},
@@ -175,7 +175,7 @@ class Unreachable(Scenario):
         self.assert_refused_here(*NO_ANSWER,
                                  lines=("request token uri Couldn't resolve host name.",))
 
-    def second_door(self, certificate):
+    def second_server(self, certificate):
         """The same provider at another port, with that certificate; returns its address."""
         port = self.device.stage.provider_port + 1
         self.device.provider.listen(port, certificate)
@@ -187,10 +187,10 @@ class Unreachable(Scenario):
 
     def test_token_endpoint_with_an_unknown_certificate(self):
         stage = self.device.stage
-        door = self.second_door(stage.unknown_certificate(stage.provider_name))
+        server = self.second_server(stage.unknown_certificate(stage.provider_name))
         for profile in PROFILES:
             with self.subTest(profile=profile):
-                self.change(profile, token_endpoint=f"{door}/{profile}/token")
+                self.change(profile, token_endpoint=f"{server}/{profile}/token")
                 self.device.provider.seen.clear()
                 self.sign_in(profile)
                 self.assert_refused_here(*NO_ANSWER, lines=(f"request token uri {self.WRONG}.",))
@@ -198,23 +198,23 @@ class Unreachable(Scenario):
                                   if path.endswith("/token")], "the code went to a stranger")
 
     def test_token_endpoint_with_a_certificate_for_another_name(self):
-        door = self.second_door(self.device.stage.device_certificate)
-        self.change("websphere", token_endpoint=door + "/websphere/token")
+        server = self.second_server(self.device.stage.device_certificate)
+        self.change("websphere", token_endpoint=server + "/websphere/token")
         self.sign_in("websphere")
         self.assert_refused_here(*NO_ANSWER, lines=(f"request token uri {self.WRONG}.",))
 
     def test_keys_from_an_unknown_certificate(self):
         stage = self.device.stage
-        door = self.second_door(stage.unknown_certificate(stage.provider_name))
-        self.change("azure", wellknown=door + "/azure/wellknown")
+        server = self.second_server(stage.unknown_certificate(stage.provider_name))
+        self.change("azure", wellknown=server + "/azure/wellknown")
         self.sign_in("azure")
         self.assert_refused_here(*NO_KEY, lines=(self.WRONG,))
 
     def test_login_page_with_an_unknown_certificate(self):
         """Here it is the browser that warns, before a password is typed."""
         stage = self.device.stage
-        door = self.second_door(stage.unknown_certificate(stage.provider_name))
-        self.change("azure", authorization_endpoint=door + "/azure/authorization")
+        server = self.second_server(stage.unknown_certificate(stage.provider_name))
+        self.change("azure", authorization_endpoint=server + "/azure/authorization")
         self.to_provider("azure")
         self.tab.wait(lambda: "ERR_CERT_AUTHORITY_INVALID" in self.tab.text,
                       "the browser's warning")

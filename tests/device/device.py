@@ -284,7 +284,7 @@ class DeviceTest(unittest.TestCase):
             f"{profile}_{name}": value for name, value in values.items()}})
 
     def user(self, browser=None):
-        """Who the device says is signed in, None if nobody is."""
+        """Who the device says is signed in, None if no user is."""
         page = (browser or self.browser).get(self.device.front_url)
         self.assertEqual(page.status, 200)
         if 'id="sign-in"' in page.body:

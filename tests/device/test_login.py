@@ -1,4 +1,4 @@
-"""What the login program does for an honest user, and against everybody else."""
+"""What the login program does for an honest user, and against everyone else."""
 
 import base64
 import concurrent.futures
@@ -146,7 +146,7 @@ class Callback(DeviceTest):
                                     "nonce does not belong to this login", browser=attacker)
 
     def test_stolen_code_and_a_state_made_to_fit(self):
-        """The attacker writes the victim's nonce into the state of a login of his own."""
+        """The attacker writes the victim's nonce into the state of his own login."""
         victims = self.callback_url()
         attacker = self.new_browser()
         own = self.callback_url(attacker)
@@ -480,7 +480,7 @@ class SetUp(DeviceTest):
                                         f"{path}: {profile}_{key} is missing or no URL")
 
     def test_line_break_in_the_endpoint(self):
-        """It does not begin a header of its own."""
+        """It does not begin another header."""
         self.change("websphere", authorization_endpoint=self.device.provider.url + "/a\nSet-Cookie: a=b\n\n")
         out = self.run_program("action=start")
         self.assertIn("#reason=internal.", out)

@@ -1,5 +1,5 @@
 // A device and its provider, all in order, which a test then spoils; and the doctor that looks
-// at it, as installed, in a process of its own.
+// at it, as installed, in its own process.
 #pragma once
 
 #include <json/value.h>

@@ -1,9 +1,12 @@
 // ssoclient-doctor, as installed, on devices with one fault each, and on healthy ones.
 #include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <chrono>
 #include <cstdio>
+#include <filesystem>
 #include <fstream>
 #include <sstream>
 
@@ -152,6 +155,26 @@ TEST_P(DoctorOnAHealthyDevice, FindsNothingWithEveryOption) {
     EXPECT_FALSE(run.findings(id).empty()) << id << run.out;
   }
   expectNoSecret(site, run);
+}
+
+// The default user, the reference's answer, its store and its settings.
+TEST_P(DoctorOnAHealthyDevice, FindsNothingAboutTheProgram) {
+  Site site(GetParam());
+  test::writeConfig("login.conf", "# of this device\ndeadline = 30\nnonce_check = yes\n", 0644);
+  test::coverFolder("/run");
+  ASSERT_EQ(mkdir("/run/ssoclient", 0755), 0);
+  ASSERT_EQ(mkdir("/run/ssoclient/sessions", 0750), 0);
+  for (const char* name : {"reference.cgi", "another.cgi"}) {
+    const std::string path = std::string("/usr/qova/") + name;
+    std::filesystem::copy_file(CGI_PROGRAM, path);
+    ASSERT_EQ(chown(path.c_str(), 0, 33), 0);
+    ASSERT_EQ(chmod(path.c_str(), 04750), 0);
+    site.arguments = {"--program", path};
+    site.deploy(false);
+    const Outcome run = runDoctor(site);
+    expectHealthy(run);
+    EXPECT_FALSE(run.findings("program").empty()) << run.out;
+  }
 }
 
 TEST_P(DoctorOnAHealthyDevice, SendsNoCredentials) {

@@ -81,7 +81,7 @@ FAULTS = [
           do=("profile.conf|file|it",)),
     Fault("azure.conf is missing", lambda place: os.unlink(path(AZURE)), EMPTY,
           ("azure.conf", "missing|does not exist|not exist|no such")),
-    Fault("settings file in capital letters", moved(AZURE, "Azure.conf"), EMPTY, ("azure.conf",),
+    Fault("settings file in upper case", moved(AZURE, "Azure.conf"), EMPTY, ("azure.conf",),
           do=("Azure.conf",)),
     Fault("settings file with .txt behind it", moved(AZURE, "azure.conf.txt"), EMPTY,
           ("azure.conf",), do=("azure.conf.txt",)),

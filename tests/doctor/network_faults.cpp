@@ -147,7 +147,7 @@ std::vector<SeededFault> wayFaults() {
          std::ostringstream one;
          one << std::ifstream("/etc/ssl/certs/ca-certificates.crt").rdbuf();
          std::string bundle;
-         for (int i = 0; i < 40; ++i) bundle += one.str();
+         for (int i = 0; i < 20; ++i) bundle += one.str();
          coverFile("/etc/ssl/certs/ca-certificates.crt", bundle);
        },
        "bundle-slow", "warning", "", "bundle with the provider's", 0, Proof::kSucceeds},

@@ -88,7 +88,7 @@ HEALTHY = [
     ("tenant's domain in the URLs", "v1", everywhere(TENANT, "ad.example.net"), ()),
     ("tenant's domain in the URLs of v2.0", "v2", everywhere(TENANT, "ad.example.net"),
      ("--try-secret",)),
-    ("host in capital letters", "v1", everywhere("login.example.net", "LOGIN.example.net"), ()),
+    ("host in upper case", "v1", everywhere("login.example.net", "LOGIN.example.net"), ()),
     ("port 443 in the URLs", "v1", everywhere("login.example.net", "login.example.net:443"), ()),
     ("discovery document of v2.0, endpoints of v1.0", "v1", put(
         wellknown=lambda url: url.replace("/.well", "/v2.0/.well")), ()),

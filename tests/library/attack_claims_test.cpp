@@ -74,8 +74,8 @@ TYPED_TEST(AttackClaims, DoNotEndAtAZeroByteWhenTheyAreCompared) {
   EXPECT_TRUE(this->accepts(this->withBody(exp + "\"the device\\u0000x\"}")));
 }
 
-// A decoded segment is a zero-terminated text: what stands behind a zero byte is not read, and what
-// stands before it has to be whole.
+// A decoded segment is a zero-terminated text: what is behind a zero byte is not read, and what
+// comes before it has to be whole.
 TYPED_TEST(AttackClaims, EndAtAZeroByteOfTheSegment) {
   const std::string zero(1, '\0');
   const std::string good = test::kCheckBody;

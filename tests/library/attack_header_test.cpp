@@ -152,7 +152,7 @@ TYPED_TEST(AttackHeader, BringsNoKeyOfItsOwn) {
   EXPECT_TRUE(attacker.requests().empty());
 }
 
-// The classic: a MAC under the public key, which everybody has.
+// The classic: a MAC under the public key, which everyone has.
 TEST_F(AttackAzureHeader, GetsNoMacUnderThePublicKeyAccepted) {
   const std::string n = anyRsaKey().n();
   const std::vector<std::string> secrets = {n,
@@ -224,7 +224,7 @@ TEST_F(AttackWebSphereHeader, FindsNoEmptyKeyBehindABadSecret) {
 
 // All short texts as keys: those that stand for no bytes are no key at all, and above all not the
 // empty one. Zero bytes are the empty key to HMAC, whatever their number: texts of "A" stand for
-// them. (Where pads stand in the wrong place, OpenSSL's reading counts, which is zero bytes too.)
+// them. (Where pads are in the wrong place, OpenSSL's reading counts, which is zero bytes too.)
 TEST(AttackKeyText, ThatStandsForNothingIsNotTheEmptyKey) {
   const std::string input = test::signingInput("{}", "{}");
   const std::string forged = input + "." + base64url(test::hmac("", input, "SHA256"));
@@ -277,7 +277,7 @@ TEST(AttackKeyText, OfPadsIsOfZeroBytes) {
   EXPECT_TRUE(isKeyText("B===", "\4"));
 }
 
-// The client encodes its secret, so that pads stand where they belong: a secret of pads is those
+// The client encodes its secret, so that pads are where they belong: a secret of pads is those
 // bytes and no other key, and no byte but zero is the empty key.
 TEST_F(AttackWebSphereHeader, ReachesNoKeyTextOfPads) {
   const auto isKey = [&](const std::string& secret, const std::string& key) {

@@ -127,7 +127,8 @@ TEST_F(AttackNumbers, AnExponentOfOneIsTheProvidersOwnUndoing) {
   const std::string forged = encodedMessage(kInput, n.size());
   const test::Log log;
   EXPECT_EQ(accepts(forged, n, one), opensslAccepts(kInput, forged, n, one, EVP_sha256()));
-  // Under any other exponent the padded digest is no signature, and an honest signature none here.
+  // Under any other exponent the padded digest is not a signature, and an honest signature none
+  // here.
   expectRefused(forged, n, e);
   expectRefused(good, n, one);
   const std::string other = encodedMessage("e30.e31", n.size());

@@ -225,7 +225,7 @@ TEST(AttackRelay, KeepsItsVerdict) {
   }
 }
 
-// Base64 of another kind, or with anything between its characters, is no state.
+// Base64 of another kind, or with anything between its characters, is not a state.
 TEST(AttackRelay, ReadsNoStateFromWhatIsNotQuiteBase64) {
   const std::string json = R"({"origin":"/?>~~>?"})";
   const std::string good = test::base64(json);

@@ -70,7 +70,7 @@ namespace {
 struct Count {
   unsigned accepted = 0;
   unsigned refused = 0;
-  unsigned direct = 0;  // in a token of their own, without the stand-in
+  unsigned direct = 0;  // in their own token, without the stand-in
 };
 
 std::ostream& operator<<(std::ostream& out, const Count& count) {
@@ -134,7 +134,7 @@ std::string fromHex(const std::string& hex) {
 
 using Fields = std::map<std::string, std::string>;
 
-// A file of lines "name = value" in NIST's form. `take` gets the fields as they stand whenever
+// A file of lines "name = value" in NIST's form. `take` gets the fields unchanged whenever
 // one named `last` was read.
 template <typename Take>
 void readFields(const std::filesystem::path& path, const std::string& last, const Take& take) {
@@ -368,7 +368,7 @@ TEST(ExamplesOfRfc4648, DecodeToTheirBytes) {
       EXPECT_THROW(jwt.JwtHMACVerify(longer, EVP_sha256()), jwt_verify_failed);
     }
   }
-  // Section 10 begins with the empty text, which is no key.
+  // Section 10 begins with the empty text, which is not a key.
   std::string none;
   Jwt jwt(input + "." + base64url(test::hmac("", input, "SHA256")));
   EXPECT_THROW(jwt.JwtHMACVerify(none, EVP_sha256()), jwt_verify_failed);
@@ -420,7 +420,7 @@ TEST(ExamplesOfRfc7520, WithAnotherPaddingAreRefused) {
 }
 
 // RFC 7515, appendix A.1 and A.2: whole tokens through the whole check of each client. They name
-// neither tenant nor audience, and expired in 2011, so that the clock stands still there.
+// neither tenant nor audience, and expired in 2011, so that the clock does not move there.
 const std::time_t kJoesExpiry = 1300819380;
 
 using ExamplesForAzure = test::TokenCheck<test::Azure>;

@@ -156,7 +156,7 @@ void* const* tableOf(const void* object) {
   return *static_cast<void* const* const*>(object);
 }
 
-// The number of functions in a table, from the size of its symbol: two words stand before them.
+// The number of functions in a table, from the size of its symbol: two words come before them.
 std::size_t lengthOf(const void* object) {
   Dl_info info;
   ElfW(Sym)* symbol = nullptr;
@@ -192,7 +192,7 @@ TEST(DispatchTable, ProvidersOverrideTheFourHooksAlone) {
   }
 }
 
-// The library's own function stands in a slot, not just a name in a header: reached as a device
+// The library's own function is in a slot, not just a name in a header: reached as a device
 // program reaches it, by its number.
 TEST(DispatchTable, LeadsToTheOperationsThemselves) {
   Settings client;

@@ -120,7 +120,7 @@ TEST_F(Wellknown, EmptyAnswerGivesTheSameLine) {
   EXPECT_TRUE(log.is({{LOG_ERR, "sso.cpp", "bad wellknown json format."}}));
 }
 
-// jsoncpp has an exception of its own for this; it counts as a failed parse.
+// jsoncpp has its own exception for this; it counts as a failed parse.
 TEST_F(Wellknown, NestingThatIsTooDeepGivesTheSameLine) {
   discover(test::ok(R"({"a":)" + std::string(5000, '[') + std::string(5000, ']') + "}"));
   EXPECT_TRUE(log.is({{LOG_ERR, "sso.cpp", "bad wellknown json format."}}));
@@ -344,7 +344,7 @@ class CollectAnswer : public testing::TestWithParam<int> {
     collect = reinterpret_cast<Collect>(const_cast<void*>(spy.pointers[CURLOPT_WRITEFUNCTION]));
   }
 
-  // Hands `bytes` over in a block of its own: nothing behind them may be read.
+  // Hands `bytes` over in its own block: nothing behind them may be read.
   unsigned give(const std::string& bytes, unsigned size, unsigned count) {
     std::vector<char> block(bytes.begin(), bytes.end());
     block.reserve(1);  // nothing has an address, too

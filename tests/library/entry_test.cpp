@@ -95,7 +95,7 @@ TEST(OIDCLogin, DoesNotGetOverABrokenRead) {
   EXPECT_TRUE(test::throws<sso_op_failed>(kUnreadable, [&] { login(&user); }));
 }
 
-// jsoncpp has an exception of its own for this; it counts as a failed parse.
+// jsoncpp has its own exception for this; it counts as a failed parse.
 TEST(OIDCLogin, DoesNotReadAFileThatIsNestedTooDeep) {
   for (const char* const text : {"[", R"({"a":)"}) {
     std::string file = R"({"sso_enable":true,"sso_profile":"azure","a":)";
@@ -220,7 +220,7 @@ TEST_F(Login, FailuresOfTheClientPassUnchanged) {
     log.clear();
     EXPECT_TRUE(test::throws<std::invalid_argument>("parse json falied", [&] { login(&user); }));
     EXPECT_EQ(user, "before");
-    // There is no token endpoint: one line tells.
+    // There is no token endpoint: one line in the log says so.
     EXPECT_EQ(log.lines().size(), 1u);
   }
 }
@@ -235,7 +235,7 @@ TEST_F(Login, ReadsTheProfileFileWithTheCallersOwnPrivileges) {
   });
 }
 
-// As installed: the profile for everybody, the providers' files for root.
+// As installed: the profile for everyone, the providers' files for root.
 TEST_F(Login, WorksForALoginProgramThatHoldsRootInReserve) {
   for (const char* const profile : {"azure", "websphere"}) {
     choose(profile, 0644);

@@ -38,7 +38,7 @@ class Folder {
   Folder& operator=(const Folder&) = delete;
 
   std::string library() const { return path / "libcurl.so.4"; }
-  // Before the folders of this run, where there are any: a library that is measured stands there.
+  // Before the folders of this run, where there are any: a library that is measured is there.
   std::string variable() const {
     const char* const others = std::getenv("LD_LIBRARY_PATH");
     return "LD_LIBRARY_PATH=" + path.string() + (others != nullptr ? ":" : "") +

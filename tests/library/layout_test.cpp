@@ -89,7 +89,7 @@ std::size_t slotOf(Member member) {
   std::ptrdiff_t parts[2];
   static_assert(sizeof member == sizeof parts, "not the Itanium C++ ABI");
   std::memcpy(parts, &member, sizeof parts);
-  // Where functions may have odd addresses, the mark of a virtual one stands in the other word.
+  // Where functions may have odd addresses, the mark of a virtual one is in the other word.
 #if defined(__arm__) || defined(__aarch64__) || defined(__mips__)
   return static_cast<std::size_t>(parts[0]) / sizeof(void*) + 1;
 #else

@@ -98,7 +98,7 @@ TEST(Relay, StateMayHold1024Bytes) {
   }
 }
 
-// jsoncpp has an exception of its own for this, and it fits into a state.
+// jsoncpp has its own exception for this, and it fits into a state.
 TEST(Relay, StateThatIsNestedTooDeepGivesNone) {
   const std::string start = R"({"origin":"a","b":)";
   EXPECT_EQ(relayOf(start + std::string(1024 - start.size(), '[')), kSuccess);

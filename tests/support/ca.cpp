@@ -113,7 +113,7 @@ void provideBundle(const std::string& path) {
 
 }  // namespace
 
-// Each authority has a name of its own: a stranger of the same name would count as a forger.
+// Each authority has its own name: a stranger of the same name would count as a forger.
 Ca::Ca()
     : key(newKey()),
       self(newCertificate(key.get(), "Test authority " + newName(), Validity::kNow)) {

@@ -109,6 +109,11 @@ void coverFile(const std::string& path, const std::string& text) {
   if (mount(cover.c_str(), path.c_str(), "", MS_BIND, nullptr) != 0) fail("cover " + path);
 }
 
+void coverFolder(const std::string& path) {
+  requireSandbox();
+  if (mount("cover", path.c_str(), "tmpfs", 0, "mode=755") != 0) fail("cover " + path);
+}
+
 void resolveToLoopback(const std::string& host) {
   std::ostringstream hosts;
   hosts << std::ifstream("/etc/hosts").rdbuf();

@@ -22,6 +22,8 @@ std::string configPath(const std::string& name);
 
 // Covers the file at `path` with `text`, for this sandbox alone; the file must exist.
 void coverFile(const std::string& path, const std::string& text);
+// Covers the folder at `path` with an empty one, for this sandbox alone.
+void coverFolder(const std::string& path);
 // Makes a host name lead to 127.0.0.1, in this sandbox alone.
 void resolveToLoopback(const std::string& host);
 

@@ -47,7 +47,7 @@ bool failsNow(const char* function, const void* caller) {
 
 }  // namespace test
 
-// FAULTY(RESULT, NAME, PARAMETERS, ARGUMENTS, FAILED): stands before the function of that name.
+// FAULTY(RESULT, NAME, PARAMETERS, ARGUMENTS, FAILED): comes before the function of that name.
 // Weak, so that a test program may have one of its own instead.
 #define FAULTY(RESULT, NAME, PARAMETERS, ARGUMENTS, FAILED)                  \
   extern "C" __attribute__((weak)) RESULT NAME PARAMETERS {                  \

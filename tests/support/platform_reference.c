@@ -1,4 +1,4 @@
-/* The reference platform under names of its own, for the spy to forward to. */
+/* The reference platform under its own names, for the spy to forward to. */
 #define QOVABase64Encode ReferenceBase64Encode
 #define QOVABase64Decode ReferenceBase64Decode
 #define QOVACGIURLEncode ReferenceCGIURLEncode

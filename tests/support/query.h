@@ -19,7 +19,7 @@ inline std::string percentDecoded(const std::string& text) {
   return bytes;
 }
 
-// The names and values, both as they stand, of "name=value&name=value".
+// The names and values, both unchanged, of "name=value&name=value".
 inline std::vector<std::pair<std::string, std::string>> parametersOf(const std::string& query) {
   std::vector<std::pair<std::string, std::string>> parameters;
   for (std::size_t at = 0; at <= query.size();) {

@@ -1,4 +1,4 @@
-/* Preloaded into a program: its clock stands at the time that CLOCK_AT tells, in seconds since the
+/* Preloaded into a program: its clock shows the time in CLOCK_AT, in seconds since the
  * epoch. */
 #include <stdlib.h>
 #include <time.h>

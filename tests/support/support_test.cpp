@@ -1,4 +1,5 @@
-// The test support itself: what other tests rely on, shown once through the library's own doors.
+// The test support itself: what other tests rely on, shown once through the library's own entry
+// points.
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>

@@ -1,5 +1,5 @@
 #!/usr/bin/python3
-"""The provider of the benchmark: the same answers over TLS, at once, to everybody.
+"""The provider of the benchmark: the same answers over TLS, at once, to everyone.
     provider.py MATERIAL CERTIFICATE KEY PORT"""
 import json
 import os

@@ -10,7 +10,7 @@
 
 namespace fuzz {
 
-// The clock stands still here, in May 2033.
+// The clock does not move here, in May 2033.
 constexpr std::time_t kNow = 2000000000;
 
 struct Device {

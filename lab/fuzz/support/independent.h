@@ -50,7 +50,7 @@ bool readJson(const std::string& text, Json::Value& value);
 std::string textOf(const Json::Value& object, const char* name);  // "" unless it is a string
 
 std::string percentDecoded(const std::string& text);
-// Whether the text holds only what may stand in the value of a query: unreserved and escapes.
+// Whether the text holds only what may be in the value of a query: unreserved and escapes.
 bool isEscaped(const std::string& text);
 std::string curlEscaped(const std::string& text);
 std::string md5Hex(const std::string& text);

@@ -1,5 +1,6 @@
-// A fuzz target: a function that gives one input to one door of the library and checks what comes
-// out. The same function serves the fuzzer (fuzzer.cpp) and the replay of the seeds (replay.cpp).
+// A fuzz target: a function that gives one input to one entry point of the library and checks what
+// comes out. The same function serves the fuzzer (fuzzer.cpp) and the replay of the seeds
+// (replay.cpp).
 #pragma once
 
 #include <exception>
@@ -9,8 +10,8 @@
 
 namespace fuzz {
 
-// Runs one input. True if the door let it through: the input was read, verified, answered. An
-// answer that must not be ends the program by require().
+// Runs one input. True if the entry point let it through: the input was read, verified, answered.
+// An answer that must not be ends the program by require().
 using Run = bool (*)(const std::string& input);
 
 struct Target {

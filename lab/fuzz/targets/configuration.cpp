@@ -1,5 +1,5 @@
 // The three configuration files. Parts: profile.conf, azure.conf, websphere.conf. A part that is
-// "missing" is no file, and one that is "folder" is a folder of that name.
+// "missing" is not a file, and one that is "folder" is a folder of that name.
 #include "sso/azuresso.h"
 #include "sso/common.h"
 #include "sso/profile.h"
@@ -52,7 +52,7 @@ void requireSettings(SSOClient& client, const File& file, const std::string& pre
   fuzz::require(client.GetToken().empty(), "a token out of a file");
 }
 
-// Without a provider to talk to nobody is signed in, whatever the files say.
+// Without a provider to talk to no user is signed in, whatever the files say.
 void requireNoLogin() {
   std::string user = "nobody";
   try {
