@@ -92,7 +92,7 @@ void AddNumbers(const std::string& text, std::set<const Code*>& found) {
   }
 }
 
-// True if the plain error at `at` stands where an error does: other texts use such words too.
+// True if the plain error at `at` is where an error is expected: other texts use such words too.
 bool IsErrorAt(const std::string& text, size_t at, size_t length) {
   const size_t end = at + length;
   if (at > 0 && IsWord(text[at - 1])) return false;

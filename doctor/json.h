@@ -1,4 +1,4 @@
-// The doctor's way with JSON. Reading goes by the library's own rules: the same reader, with its
+// How the doctor reads JSON: by the library's rules, with the same reader. Its
 // leniency, and its limits.
 #pragma once
 

@@ -191,7 +191,7 @@ class ProgramCheck {
         std::string::npos;
     if (failed && !settled && caller.uid == 0) {
       return Add("program-error", Grade::kFailure, "does not serve a web server that runs as root",
-                 "Let the web server run as a user of its own, and name it with --user.");
+                 "Let the web server run as a separate user, and name it with --user.");
     }
     if (checkup.reference_program ? failed && !settled : code >= "500") {
       return Add(

@@ -243,20 +243,21 @@ std::string ProxyFor(const std::string& url) {
   return "";
 }
 
-long BundleMilliseconds() {
+BundleTime ReadBundle() {
   const std::string bundle = TrustStore().substr(0, TrustStore().find(", "));
-  long least = 0;
+  BundleTime least;
   for (int i = 0; i < 3; ++i) {  // the first time is longer
     const std::unique_ptr<SSL_CTX, Deleter<SSL_CTX_free>> context(SSL_CTX_new(TLS_client_method()));
     const auto start = std::chrono::steady_clock::now();
+    const std::clock_t begun = std::clock();
     if (context == nullptr ||
         SSL_CTX_load_verify_locations(context.get(), bundle.c_str(), nullptr) != 1) {
-      return 0;
+      return {};
     }
     const std::chrono::duration<double, std::milli> taken =
         std::chrono::steady_clock::now() - start;
-    const long milliseconds = static_cast<long>(taken.count());
-    least = i == 0 ? milliseconds : std::min(least, milliseconds);
+    const double processor = 1000.0 * static_cast<double>(std::clock() - begun) / CLOCKS_PER_SEC;
+    if (i == 0 || taken.count() < least.clock) least = {taken.count(), processor};
   }
   return least;
 }

@@ -53,8 +53,13 @@ WebAnswer Fetch(const std::string& url, const std::string* body, int seconds, bo
 // The proxy that the environment names for the URL; empty if there is none.
 std::string ProxyFor(const std::string& url);
 
-// How long libcurl takes to read the certificate authorities, which it does for each request.
-long BundleMilliseconds();
+// How long libcurl takes to read the certificate authorities, which it does for each request; in
+// milliseconds, of a clock and of the processor.
+struct BundleTime {
+  double clock = 0;
+  double processor = 0;
+};
+BundleTime ReadBundle();
 
 // The bundle and the folder of certificate authorities that libcurl uses.
 std::string TrustStore();

@@ -25,7 +25,7 @@ class SSOCLIENT_API Jwt {
   Json::Value GetHeader();
   Json::Value GetBody();
 
-  // GetSignature returns the third segment as it stands in the token, not decoded.
+  // GetSignature returns the third segment as it is in the token, not decoded.
   std::string GetSignature();
 
   // JwtRSAVerify checks an RSASSA-PKCS1-v1_5 signature (RFC 7518, section 3.3) under the public

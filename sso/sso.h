@@ -91,8 +91,8 @@ class SSOCLIENT_API SSOClient {
 // OIDCLogin signs a user in from the authorization code that the provider gave the redirect
 // URI. On success `user` holds the name under which the device signs the user in.
 //
-// It reads "/usr/qova/etc/ssoclient/profile.conf" with the caller's own privileges, and goes by
-// its "sso_enable" alone, not by isEnable() of the client. Throws:
+// It reads "/usr/qova/etc/ssoclient/profile.conf" with the caller's own privileges, and uses
+// its "sso_enable" alone, not isEnable() of the client. Throws:
 // - sso_op_failed "read profile file failed.": the file is missing, unreadable or not JSON
 // - sso_op_failed "sso does not enable.": "sso_enable" is not the boolean true
 // - sso_op_failed "not specify sso profile": "sso_profile" is not a string

@@ -28,7 +28,7 @@ int HexDigit(char c) {
   return -1;
 }
 
-// A "%" that no two digits follow stands for itself.
+// A "%" that no two digits follow is kept as it is.
 std::string Decode(const std::string& text) {
   std::string out;
   for (size_t i = 0; i < text.size(); ++i) {

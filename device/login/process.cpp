@@ -2,6 +2,7 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <poll.h>
 #include <signal.h>
 #include <sys/prctl.h>
 #include <sys/resource.h>
@@ -23,7 +24,7 @@ namespace {
 
 constexpr int kFirstDeadline = 30;         // until the settings are read
 constexpr rlim_t kChildMemory = 64 << 20;  // beyond what it has when it starts
-#ifdef __SANITIZE_ADDRESS__  // whose shadow takes terabytes
+#ifdef __SANITIZE_ADDRESS__                // whose shadow takes terabytes
 constexpr bool kLimitMemory = false;
 #else
 constexpr bool kLimitMemory = true;
@@ -33,15 +34,19 @@ constexpr rlim_t kChildFile = 1 << 20;
 volatile sig_atomic_t answered = 0;
 char reference[9] = "22222222";  // made early: a signal handler cannot
 
-// A line to the system log, without syslog(): that waits as long as the log's socket is full.
-void LogWithoutWaiting(const char* name, const char* text) {
+// A line to the system log, without syslog(): that waits as long as the log's socket is full. This
+// waits half a second at most.
+void LogQuickly(const char* name, const char* text) {
   char line[256];
   const int size = std::snprintf(line, sizeof line, "<11>login.cgi: sign-in failed [%s]: %s: %s",
                                  reference, name, text);
   const int log = socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
   sockaddr_un address{AF_UNIX, "/dev/log"};
   if (connect(log, reinterpret_cast<sockaddr*>(&address), sizeof address) == 0) {
-    (void)!send(log, line, static_cast<size_t>(size), MSG_NOSIGNAL);
+    pollfd room{log, POLLOUT, 0};
+    for (int i = 0; i < 5 && send(log, line, static_cast<size_t>(size), MSG_NOSIGNAL) < 0; ++i) {
+      poll(&room, 1, 100);
+    }
   }
 }
 
@@ -133,7 +138,7 @@ void EndNow(const char* name, const char* text) {
                                    name, reference);
     (void)!write(STDOUT_FILENO, page, static_cast<size_t>(size));
   }
-  LogWithoutWaiting(name, text);
+  LogQuickly(name, text);
   _exit(1);
 }
 

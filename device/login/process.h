@@ -22,8 +22,8 @@ void SetDeadline(int seconds);
 // Answered says that the program is about to write its answer: the deadline writes no other.
 void Answered();
 
-// EndNow ends the program at once, with a failure for the browser and a line in the log, neither
-// of which waits for anybody. `name` is the failure's, for instance "timeout".
+// EndNow ends the program at once, with a failure for the browser and a line in the log. It
+// does not wait for a log that nobody reads. `name` is the failure's, for instance "timeout".
 [[noreturn]] void EndNow(const char* name, const char* text);
 
 // Confine gives a child process its limits of memory, processor time and file size, and lets it end

@@ -19,7 +19,7 @@ class Curve:
 
     def measure(self, programs):
         for label, program, operation in (("library", "bench_library", self.operation),
-                                          ("by hand", "bench_floor", self.operation),
+                                          ("baseline", "bench_floor", self.operation),
                                           ("parser", "bench_floor", self.parser)):
             if operation is not None:
                 self.lines[label] = self.line(programs, program,

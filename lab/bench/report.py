@@ -77,8 +77,8 @@ class Bars:
         keys = found.growth[1]
         self.at_most("one more key in the set, of its parsing alone",
                      keys.slope("library") / keys.slope("parser"), 1.08)
-        self.at_most("the same, of the login by hand", keys.slope("library") /
-                     keys.slope("by hand"), 1.08)
+        self.at_most("the same, of the hand-written baseline of a login", keys.slope("library") /
+                     keys.slope("baseline"), 1.08)
         size, named, _, foreign = found.shared_object
         self.at_most("stripped object, bytes", size, 110 * 1024)
         self.at_most("relocations bound by name", named, 60)
@@ -89,11 +89,11 @@ class Bars:
             self.of_fastest(what, dict(others), limit)
 
     def of_fastest(self, what, others, limit):
-        by_hand = others.pop("by hand")
+        by_hand = others.pop("baseline")
         for number, unit in enumerate(("time", "instructions") if others else ()):
             fastest = min(other[number] for other in others.values())
             self.at_most("%s, of the fastest peer, %s" % (what, unit), 1 / fastest, limit)
-            self.rows.append(("the same by hand, %s" % unit, "%.3f" % (by_hand[number] / fastest),
+            self.rows.append(("the same of the baseline, %s" % unit, "%.3f" % (by_hand[number] / fastest),
                               "-", "-"))
 
     def at_most(self, what, value, limit):
@@ -107,11 +107,11 @@ def write(found):
              "Made by `scripts/check bench` on %s.\n\nMachine: %s.\n\nVersions: %s." % (
                  datetime.date.today().isoformat(), machine(), versions()),
              "Ratios are medians of ratios within a round; in a round all programs run in turn. "
-             "\"By hand\" is the same work on the same libraries with nothing between the steps "
+             "\"Baseline\" is the same work, hand-written on the same libraries with nothing between the steps "
              "that have to be made (`lab/bench/floor.cpp`). lab/bench/README.md describes the method.",
              "## Limits", table(("what", "found", "limit", "kept"), Bars(found).rows),
              "## Within a process",
-             table(("work", "by hand, µs", "library, µs", "ratio, time", "ratio, instructions"),
+             table(("work", "baseline, µs", "library, µs", "ratio, time", "ratio, instructions"),
                    [(what, microseconds(floor), microseconds(library), "%.3f" % ratio,
                      "%.3f" % counted)
                     for _, what, floor, library, ratio, counted in found.operations]),
@@ -119,7 +119,7 @@ def write(found):
              "How much of this library's time another takes (in brackets: instructions). Its "
              "shortest way each: libjwt has one call for everything and takes the key as PEM. Not "
              "all do the same: cjose decodes with its own code, not through OpenSSL's filters. "
-             "By hand is as above: no limit below it can be kept.",
+             "The baseline is as above: no limit below it can be kept.",
              peer_table(found.peers),
              "## Programs that make no request",
              table(("program", "ms", "ratio", "ratio, processor time", "instructions",

@@ -62,7 +62,7 @@ def guard(programs):
         ratio = library[name] / floor[name]
         good = ratio <= limit
         failed += not good
-        print("%-7s %-20s %10d instructions, %10d by hand: %.3f, at most %.2f" % (
+        print("%-7s %-20s %10d instructions, %10d of the baseline: %.3f, at most %.2f" % (
             "ok" if good else "NOT OK", name, library[name], floor[name], ratio, limit))
     print("%d passed, %d failed" % (len(limits) - failed, failed))
     return 1 if failed or not limits else 0
@@ -81,8 +81,8 @@ def measure_operations(programs):
 
 def measure_peers(programs):
     """Microseconds, and of each peer its time and its instructions for one of the library's; among
-    the peers the work by hand."""
-    peers = {"by hand": "bench_floor", **{name: "peer_" + name for name in programs.peers()}}
+    the peers the hand-written baseline."""
+    peers = {"baseline": "bench_floor", **{name: "peer_" + name for name in programs.peers()}}
     all_of_them = ["bench_library"] + list(peers.values())
     counts = {program: programs.instructions(program, AGAINST_PEERS, 1)
               for program in all_of_them}
@@ -143,7 +143,7 @@ def main(arguments):
         return guard(programs)
 
     found = report.Findings()
-    say(started, "operations within a process, by hand and by the library")
+    say(started, "operations within a process, baseline and library")
     found.operations = measure_operations(programs)
     say(started, "the same by other libraries")
     found.peers = measure_peers(programs)

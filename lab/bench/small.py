@@ -95,7 +95,7 @@ def write(arm, rows):
         "instructions; memory of 32-bit programs (i386) on this machine's own processor. "
         "Times of an emulator mean nothing, and are left out." % datetime.date.today().isoformat(),
         "## Instructions within a process, armhf",
-        report.table(("work", "by hand", "library", "ratio"), operations),
+        report.table(("work", "baseline", "library", "ratio"), operations),
         "## Instructions of programs that make no request, armhf",
         report.table(("program", "instructions", "ratio"), without),
         "## Instructions of a login over TLS, armhf",

@@ -7,7 +7,7 @@
 // DEFECT is what each login leaves behind: leak, open, thread, child; or lose, for valgrind.
 //
 // The client runs as a login program does: as a user, with root as the saved identity. Another
-// process looks at it from outside. With "name" the provider is known by a host name that libcurl
+// process measures it from outside. With "name" the provider is known by a host name that libcurl
 // looks up, otherwise by its address. Prints what it measured; exit status 1 if anything grew, was
 // left over, or went wrong. Needs a sandbox (scripts/check endurance).
 #include <dirent.h>
@@ -343,7 +343,7 @@ int run(const std::vector<std::string>& arguments) {
           "usage: endurance azure|websphere LOGINS [tls] [name] | [processes] [DEFECT]");
   const std::string& client = arguments[0];
   const long logins = std::stol(arguments[1]);
-  require(has("processes") || logins >= kSamples, "too few logins to look at");
+  require(has("processes") || logins >= kSamples, "too few logins to measure");
   test::requireSandbox();
 
   const test::Ca authority;

@@ -240,7 +240,7 @@ static const char* optionThatFails(CURLoption option) {
     case CURLOPT_WRITEDATA:
       return nullptr;
     default:
-      abort();  // the library sets an option that nobody has thought about
+      abort();  // the library sets an option that is not known here
   }
 }
 

@@ -115,7 +115,7 @@ void makeFixtures() {
 }
 
 std::string providerUrl(const std::string& path) {
-  if (provider == nullptr) return "http://127.0.0.1:9" + path;  // nobody listens there
+  if (provider == nullptr) return "http://127.0.0.1:9" + path;  // no server listens there
   const bool tls = provider->url("").compare(0, 5, "https") == 0;
   return provider->url(path, tls ? "localhost" : "127.0.0.1");
 }

@@ -8,7 +8,7 @@
 
 namespace faults {
 
-// "FILE:<digits> MESSAGE" at that priority. In the message "%m" stands for the text of errno when
+// "FILE:<digits> MESSAGE" at that priority. In the message "%m" represents the text of errno when
 // it was written, and "%t" for any one text that libcurl has for an error.
 struct Line {
   int priority;

@@ -1,7 +1,7 @@
 // Runs every operation of the library with each allocation, and each call that can fail, failing
 // once: alone, and with all that follow. After each run: the outcome is one of those expected,
 // nothing was kept (memory, descriptors), the process ids are what the guard leaves, and the
-// system log holds the library's own lines alone. Operations are run in processes of their own.
+// system log holds the library's own lines alone. Each operation runs in its own process.
 //   fault_test [--every N] [--fresh N] [--measured] [NAME...]
 // NAME limits it to operations that begin so; --every N takes every N-th allocation of those that
 // talk TLS, --fresh N of those in fresh processes. --measured: the library carries a run time of
@@ -46,7 +46,7 @@ long every = 1;
 long everyFresh = 1;
 bool measured = false;
 
-// What a child process tells its parent, and where it was when it died.
+// What a child process reports to its parent, and where it was when it died.
 struct Report {
   Plan next;  // where to go on
   bool finished;
@@ -474,7 +474,7 @@ void runOperation(const Operation& operation, bool cold, Totals* totals) {
     static const std::set<std::string> kNothing = {
         "SSOClient::isEnable",       "SSOClient::GetToken",     "SSOClient::SetCode",
         "SSOClient::SetRedirectURI", "SSOProfile::SSOIsEnable", "SSOProfile::GetSSOProfile",
-        "SSOProfile::GetSSOClient"};  // they take no memory and call nobody
+        "SSOProfile::GetSSOClient"};  // they take no memory and make no call
     if (kNothing.count(operation.name) == 0) {
       std::printf("  %s: nothing was injected\n", operation.name.c_str());
       ++totals->failed;

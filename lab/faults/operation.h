@@ -45,13 +45,13 @@ class Run {
   std::vector<test::LogLine> written;  // by the armed part
 };
 
-using Outcomes = std::vector<std::string>;  // a "*" at the end stands for anything
+using Outcomes = std::vector<std::string>;  // a "*" at the end matches anything
 
 struct Operation {
   // What is called, as the library's headers name it, and perhaps ", " and which variant it takes.
   std::string name;
   std::string good;  // the outcome when nothing fails
-  // The outcomes when that function fails; "memory" stands for any allocation, "several" for
+  // The outcomes when that function fails; "memory" means any allocation, "several" the
   // functions that fail together, and a "+" behind a name for that function with all that follow.
   // Not listed: the outcome is the good one; when memory runs out it may always be std::bad_alloc.
   std::map<std::string, Outcomes> on;

@@ -925,7 +925,7 @@ void addLogins(std::vector<Operation>* all) {
   add(", no profile", "QOVA::SSO::sso_op_failed: not specify sso profile", {}, configureNoProfile,
       Server::kNone);
   add(", a broken file", unreadable, {}, configureBroken, Server::kNone);
-  // Whatever fails on the way, a forged token signs nobody in.
+  // Whatever fails on the way, a forged token signs no user in.
   add(", Azure, a forged token", kNoRSA,
       segments + rsa() + transfer({kBadResponse, kNoKey}) + form + settings({kBadResponse, kNoRSA}),
       configureForgedAzure, Server::kPlain);

@@ -2,7 +2,7 @@
 
   sign_in.py IMAGE
 
-The image is mounted read-only and its own start script runs in it. Around it stand what a device
+The image is mounted read-only and its own start script runs in it. Around it is what a device
 has outside of its image: names, certificate authorities, a system log, settings, something that
 speaks TLS; and the provider.
 """

@@ -138,7 +138,7 @@ class HostileProviderTest : public testing::Test {
       ++refused;
       ++ends[outcome.kind];
     }
-    EXPECT_GE(provider.turns(), 1) << trace << ": nobody asked";
+    EXPECT_GE(provider.turns(), 1) << trace << ": no request came";
     connections += static_cast<unsigned>(provider.turns());
   }
 

@@ -1,5 +1,5 @@
-// Providers that cannot be trusted, speak what nobody should, or send without end, at each of the
-// three requests of a login. (hostile_generated_test.cpp has those that break off or lie.)
+// Providers that cannot be trusted, speak what no provider should, or send without end, at each of
+// the three requests of a login. (hostile_generated_test.cpp has those that break off or lie.)
 #include <curl/curl.h>
 #include <gtest/gtest.h>
 #include <openssl/ssl.h>
@@ -79,7 +79,7 @@ size_t memoryOf(const std::function<void()>& login) {
   return kilobytes < 0 ? 0 : static_cast<size_t>(kilobytes) / 1024;
 }
 
-// A login whose three requests go to servers of their own.
+// A login whose three requests go to separate servers.
 class Hostile : public testing::Test {
  protected:
   Hostile() {
@@ -153,7 +153,7 @@ class Hostile : public testing::Test {
     EXPECT_TRUE(known);
   }
 
-  // The server at this place is of this kind: nothing is sent to it, and nobody signed in.
+  // The server at this place is of this kind: nothing is sent to it, and no user is signed in.
   void expectRefused(const Identity& identity, const test::Dialect& dialect, CURLcode code,
                      const std::string& what) {
     for (size_t place = 0; place < 3; ++place) {

@@ -327,7 +327,7 @@ Function EncodeLines() {
   Function function = {
       "QOVABase64Encode",
       {{"encode-bytes", "gives the standard base64 text of every byte", EncodesBytes},
-       {"encode-lengths", "gives it for every length, without line breaks", EncodesLengths},
+       {"encode-lengths", "gives the text of every length, without line breaks", EncodesLengths},
        {"encode-nothing", "encoding nothing succeeds with an empty text", EncodesNothing},
        {"encode-zero", "writes a terminating zero behind the text", EndsTheText},
        {"encode-capacity", "a text that does not fit with its zero fails, any other succeeds",

@@ -79,7 +79,7 @@ int Conclude(const Totals& totals) {
     return kBroken;
   }
   const bool complete = all > 0 && totals.not_judged == 0;
-  puts(complete ? "Nothing speaks against their use." : "The check is not complete.");
+  puts(complete ? "The functions keep the contract." : "The check is not complete.");
   return complete ? kKept : kNotChecked;
 }
 

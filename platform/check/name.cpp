@@ -207,7 +207,7 @@ Function NameLines() {
        {"name-1023", "a result fills the library's 1,023 bytes, or fails", FillsTheBuffer},
        {"name-people", "two people never get one name", KeepsPeopleApart},
        {"name-odd", "odd names fail, or give a text that ends within the size", SurvivesOddNames},
-       {"name-long", "so do names of up to 100,000 bytes", SurvivesLongNames},
+       {"name-long", "names of up to 100,000 bytes fail, or give such a text", SurvivesLongNames},
        {"name-data", "a name is data: never a format, never a command", TakesNamesAsData},
        {"name-source", "reads up to the name's zero alone, and does not change it", NameSource}}};
   AddHabits<ConvertCall>({"name-repeat", "name-pointers", "name-process", "name-memory"},

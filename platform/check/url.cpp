@@ -168,7 +168,7 @@ Function URLLines() {
       "QOVACGIURLEncode",
       {{"url-bytes", "every byte is safe in a URL's query and in a form, and reads back",
         EncodesEveryByte},
-       {"url-texts", "so are texts, with escapes and line feeds in them", EncodesTexts},
+       {"url-texts", "texts with escapes and line feeds are safe and read back", EncodesTexts},
        {"url-nothing", "encoding nothing succeeds, with a capacity of 0 too", EncodesNothing},
        {"url-zero", "writes a terminating zero behind the text", EndsTheText},
        {"url-capacity", "what does not fit fails; the capacity does not count the zero",

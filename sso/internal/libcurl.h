@@ -25,7 +25,7 @@ struct Curl {
 // the next call tries again.
 const Curl& LoadCurl();
 
-// curl_global_cleanup, unless libcurl is not to be had: then there is nothing to clean up.
+// curl_global_cleanup, unless libcurl cannot be loaded: then there is nothing to clean up.
 void CleanUpCurl();
 
 }  // namespace SSO

@@ -1,4 +1,4 @@
-// The shortest login program, which works and withstands little: for the test of scripts/check login.
+// The shortest login program: it works and withstands little. For the test of scripts/check login.
 #include <cstdlib>
 #include <exception>
 #include <iostream>

@@ -4,5 +4,6 @@
 #pragma once
 
 extern "C" __attribute__((used, weak, visibility("default"))) const char* __asan_default_options() {
-  return "detect_leaks=0:verify_asan_link_order=0:abort_on_error=0:exitcode=66:log_path=/dev/stderr";
+  return "detect_leaks=0:verify_asan_link_order=0:abort_on_error=0:exitcode=66:log_path=/dev/"
+         "stderr";
 }

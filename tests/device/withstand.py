@@ -390,7 +390,7 @@ def secrets_in_the_log(login):
 DANGERS = (
     ("Somebody else's login", (
         ("a code in a browser that started no login", no_login_started),
-        ("another login's code and state in the middle of one's own", other_login_started))),
+        ("another login's code and state while one's own is open", other_login_started))),
     ("A stolen code", (
         ("in a login of the thief's own", own_code_injected),
         ("with a state that was made to fit", nonce_in_the_state),
@@ -411,7 +411,7 @@ DANGERS = (
         ("line breaks and markup in an error", words_in_the_address),
         ("a page of another site as the origin", foreign_origin),
         ("the same in a changed state", foreign_origin_in_the_state),
-        ("states that are none", unusable_states))),
+        ("malformed states", unusable_states))),
     ("The program itself", (
         ("variables of the environment have an effect", environment),
         ("the provider is asked with root's rights", not_as_root),

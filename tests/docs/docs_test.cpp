@@ -129,6 +129,34 @@ TEST(Literals, AreReadAsACompilerDoes) {
   EXPECT_EQ(literals.found, (Texts{"a.h", "one two", "th\"ree", "raw \"text\""}));
 }
 
+// Relative links of a document, without their anchors.
+Texts links(const fs::path& document) {
+  return matches(contents(document), R"(\]\(([^):#]+)(#[^)]*)?\))");
+}
+
+TEST(Documents, LinkOnlyToWhatIsInstalledWithThem) {
+  const std::string list = contents(kRoot / "docs/CMakeLists.txt");
+  const Texts installed = matches(list, R"(([\w-]+\.md))");
+  EXPECT_GT(installed.size(), 4u);
+  for (const std::string& name : installed) {
+    for (const std::string& link : links(kRoot / "docs" / name)) {
+      EXPECT_TRUE(installed.count(link) == 1 || link.rfind("pictures/", 0) == 0)
+          << name << " links to " << link;
+      EXPECT_TRUE(fs::exists(kRoot / "docs" / link)) << name << " links to " << link;
+    }
+  }
+}
+
+TEST(Documents, ReadmeShowsTheLoginProgram) {
+  const std::string source = contents(kRoot / "device/login/signin.cpp");
+  std::string shown = section(contents(kRoot / "README.md"), "```cpp\n", "\n```\n").substr(7);
+  EXPECT_NE(shown.find("VerifyIDToken"), std::string::npos);
+  const size_t middle = shown.find("\n\ntemplate");
+  ASSERT_NE(middle, std::string::npos);
+  EXPECT_NE(source.find(shown.substr(0, middle)), std::string::npos);
+  EXPECT_NE(source.find(shown.substr(middle + 2)), std::string::npos);
+}
+
 TEST(Messages, HoldEveryTextOfTheLibrary) {
   const std::string page = contents(kRoot / "docs/messages.md");
   const Texts texts = libraryTexts();

@@ -38,6 +38,6 @@ inline std::ostream& operator<<(std::ostream& out, const SeededFault& fault) {
 
 std::vector<SeededFault> allFaults();
 std::vector<SeededFault> localFaults();  // those of local_faults.cpp, which are among them
-std::vector<SeededFault> wayFaults();  // between device and provider; network_faults.cpp
+std::vector<SeededFault> wayFaults();    // between device and provider; network_faults.cpp
 
 }  // namespace test

@@ -162,7 +162,7 @@ std::vector<SeededFault> answerFaults() {
             installProgram(s, "internal.cgi");
             s.arguments.insert(s.arguments.end(), {"--user", "root"});
           },
-          "program-error", "failure", "runs as root", "a user of its own"),
+          "program-error", "failure", "runs as root", "a separate user"),
       local("RunHangs", program("hang.cgi"), "program-silent", "failure", "within 2 s",
             "system log"),
       local("RunCrashes", program("crash.cgi"), "program-crashed", "failure", "Segmentation fault",

@@ -91,7 +91,7 @@ const std::vector<TwinFault> kEntraFaults = {
      "failure", "AADSTS700016", "azure_client_id", Works::kNo},
     {"TenantUnknown", Twin::kEntra2, tenant(kOther), "authorization-refused", "failure",
      "AADSTS90002", "tenant", Works::kNo},
-    {"TenantPlaceholder", Twin::kEntra1, tenant("YOUR_TENANT"), "authorization-refused", "failure",
+    {"TenantMisspelt", Twin::kEntra1, tenant("adexamplenet"), "authorization-refused", "failure",
      "AADSTS900023", "placeholder", Works::kNo},
     {"TenantUnknownForTokens", Twin::kEntra2,
      part(kToken, test::kTwinTenant, "unknown.example.net"), "token-endpoint-refuses", "failure",

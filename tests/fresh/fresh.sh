@@ -33,7 +33,7 @@ fresh_copy() {
   cp /etc/resolv.conf "$1/etc/resolv.conf"
 }
 
-# in_fresh FOLDER COMMAND...: runs a command in there, in namespaces of its own.
+# in_fresh FOLDER COMMAND...: runs a command in there, in private namespaces.
 in_fresh() {
   unshare --mount --pid --fork --kill-child --propagation private -- sh -c '
     mount --bind "$1" "$1" && cd "$1" &&

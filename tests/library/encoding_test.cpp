@@ -17,7 +17,7 @@ bool noDigest = false;
 
 }  // namespace
 
-// Stands before OpenSSL's: gives null when told to.
+// Comes before OpenSSL's: returns null on demand.
 extern "C" __attribute__((visibility("default"))) unsigned char* MD5(const unsigned char* data,
                                                                      size_t size,
                                                                      unsigned char* digest) {

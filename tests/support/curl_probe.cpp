@@ -1,4 +1,4 @@
-// A login program without a libcurl of its own. It says when libcurl is in the process, and how
+// A login program without its own libcurl. It says when libcurl is in the process, and how
 // requests end.
 #include <exception>
 #include <fstream>

@@ -30,7 +30,7 @@ void resolveToLoopback(const std::string& host);
 // The bytes that reach file descriptor 1 during `call`, after a flush.
 std::string stdoutOf(const std::function<void()>& call);
 
-// Stands in for the buffer of std::cout and records each write and each flush.
+// Replaces the buffer of std::cout and records each write and each flush.
 class CoutRecorder : public std::streambuf {
  public:
   CoutRecorder();

@@ -1,4 +1,4 @@
-// Writes the seeds that hold signatures or exact lengths, so that nobody has to make them by hand.
+// Writes the seeds that hold signatures or exact lengths.
 //   fuzz_seeds FOLDER           writes them to FOLDER/TARGET/NAME
 //   fuzz_seeds --check FOLDER   compares them with what is there
 // Seeds named good-* get through; all others must not (fuzz_replay --named).

@@ -52,7 +52,7 @@ void take(Handle& handle, CURLoption option, void* value) {
       handle.request.verified = value != nullptr;
       break;
     default:
-      require(false, "an option that nobody asked for");
+      require(false, "an option that was not asked for");
   }
 }
 

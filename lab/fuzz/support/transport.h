@@ -1,4 +1,4 @@
-// What stands in for the network. The fuzz program defines libcurl's functions itself: either they
+// Replaces the network. The fuzz program defines libcurl's functions itself: either they
 // hand out the scripted answers, or (`real`) libcurl runs, on a socket that holds the answer
 // already. Either way the library's own code handles every byte.
 #pragma once
@@ -27,7 +27,7 @@ struct Request {
 };
 
 struct Transport {
-  // Given in this order; then nobody listens any more.
+  // Given in this order; then no server listens any more.
   std::vector<Answer> answers;
   std::vector<Request> requests;
 

@@ -47,7 +47,7 @@ FUZZ_TARGET(base64url) {
   fuzz::require(!empty || !isKeyOf("", input), "a text became the empty key");
   const bool strict = bytes.has_value() && !bytes->empty();
   const bool isKey = strict && isKeyOf(*bytes, input);
-  fuzz::require(isKey == strict, "not the bytes that the text stands for");
+  fuzz::require(isKey == strict, "not the bytes that the text encodes");
   readAsSegment(input);
   readAsSignature(input);
   return isKey;

@@ -1,5 +1,5 @@
 // Key and token: the library's HMAC check against OpenSSL's one-shot call.
-// Parts: a digest ("SHA384"), key text, token; "!" as the last segment stands for the right MAC.
+// Parts: a digest ("SHA384"), key text, token; "!" as the last segment means the right MAC.
 #include <openssl/evp.h>
 
 #include "sso/jwt.h"

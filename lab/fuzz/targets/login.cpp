@@ -1,5 +1,5 @@
 // All that a provider says during a login. Parts: "azure" or "websphere", token response,
-// discovery document, key set. Nobody but the user that the honest provider signed for gets in.
+// discovery document, key set. Only the user that the honest provider signed for gets in.
 #include "sso/common.h"
 #include "sso/sso.h"
 
@@ -54,7 +54,7 @@ FUZZ_TARGET(login) {
   std::string user = "nobody";
   if (!signsIn(&user)) return false;
   const std::string set = websphere ? "" : fuzz::received(keys);
-  fuzz::require(isSignedFor(fuzz::received(response), set), "a token that nobody signed");
+  fuzz::require(isSignedFor(fuzz::received(response), set), "a token that was not signed");
   fuzz::require(fuzz::transport().requests.size() == (websphere ? 1 : 3), "other requests");
   if (websphere) fuzz::require(user == fuzz::kWebSphereUser, "somebody else was signed in");
   return user == (websphere ? fuzz::kWebSphereUser : fuzz::kAzureUser);

@@ -10,7 +10,7 @@ const std::string kStart = "ssoclient/relay.html#";
 const std::string kEnd = "success=true";
 const std::string kOrigin = "origin=";
 
-// What stands between start and end; never anything that could end the fragment or the line.
+// What is between start and end; never anything that could end the fragment or the line.
 std::string between(const std::string& url) {
   fuzz::require(url.size() >= kStart.size() + kEnd.size(), "a short URL");
   fuzz::require(url.compare(0, kStart.size(), kStart) == 0, "another start");
