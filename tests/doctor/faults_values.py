@@ -1,6 +1,6 @@
 """Values of the settings: identifiers, secrets, endpoints, redirect URI."""
 
-from place import (CALLBACK, CLIENT, ENTRA_URL, OTHER_TENANT, RELAY, SECRET, SECRET_ID,
+from place import (CALLBACK, CLIENT, ENTRA_URL, LIBERTY_SECRET, OTHER_TENANT, RELAY, SECRET, SECRET_ID,
                    TENANT)
 from row import EITHER, WARNING, Fault, all_of, put, twin
 
@@ -70,8 +70,8 @@ FAULTS = [
           never=(CLIENT,)),
     Fault("client ID of another client", put(client_id="router"), "CWOAU0061E", ("client",),
           at=("websphere_client_id",), base="liberty"),
-    Fault("client ID in upper case at Liberty", put(client_id="Device"), "CWOAU0061E",
-          ("client",), at=("websphere_client_id",), base="liberty"),
+    Fault("client ID in upper case at Liberty", put(client_id="Device"), "CWOAU0061E", ("client",),
+          at=("websphere_client_id",), base="liberty"),
     # -- secrets
     Fault("secret expired", twin(secret_expired=True), "AADSTS7000222", ("secret", "expired"),
           at=("azure_client_secret",), do=("new|secret",), run=TRY),
@@ -102,8 +102,9 @@ FAULTS = [
     Fault("no secret", put(client_secret=""), "AADSTS7000218", ("azure_client_secret", "empty")),
     Fault("public client at the provider", twin(public_client=True), "AADSTS700025", ("public",),
           do=("public|web|platform|azure_client_secret|registration",), run=TRY),
-    Fault("secret wrong at Liberty", put(client_secret="x" * 48), "we cannot find key 'id_token'",
-          ("secret",), at=("websphere_client_secret",), run=TRY, base="liberty"),
+    Fault("secret wrong at Liberty", put(client_secret=LIBERTY_SECRET[::-1]),
+          "we cannot find key 'id_token'", ("secret",), at=("websphere_client_secret",), run=TRY,
+          base="liberty"),
     Fault("Liberty's encoded secret copied", put(client_secret="{xor}CDo9Hg8sLTs8PTY4PjoxPTAzKj4="),
           "we cannot find key 'id_token'", ("secret|credential",), at=("websphere_client_secret",),
           run=TRY, base="liberty"),
@@ -132,7 +133,7 @@ FAULTS = [
     Fault("token endpoint without https://", put(token_endpoint=other("https://", "")),
           "parse json falied", ("https|scheme",), at=AT_TOKEN, do=("https://",)),
     Fault("token endpoint with http", put(token_endpoint=other("https:", "http:")),
-          "parse json falied", ("http",), at=AT_TOKEN, do=("https",)),
+          "parse json falied", ("http",), at=AT_TOKEN, do=("https",), grade=EITHER),
     Fault("host misspelt", put(token_endpoint=other("login.", "logn.")), "resolve",
           ("name|host|resolve",), at=("azure_token_endpoint|logn.example.net",)),
     Fault("authorization endpoint's host misspelt",
@@ -218,7 +219,7 @@ FAULTS = [
           grade=WARNING, base="liberty"),
     # -- redirect URI
     Fault("redirect URI with http", put(redirect_uri=other("https:", "http:")), "AADSTS50011",
-          ("http|redirect",), at=("azure_redirect_uri",), do=("https",)),
+          ("http|redirect",), at=("azure_redirect_uri",), do=("https",), grade=EITHER),
     Fault("redirect URI with a slash at its end", put(redirect_uri=CALLBACK + "/"), "AADSTS50011",
           ("redirect",), at=("azure_redirect_uri",), do=("regist|azure_redirect_uri",)),
     Fault("redirect URI not registered", twin(redirect_uris=[RELAY]), "AADSTS50011",
@@ -238,7 +239,7 @@ FAULTS = [
           at=("azure_redirect_uri",)),
     Fault("redirect URI with a wrong port",
           registered("https://device.example.net:8443/webman/login.cgi"), ":8443/",
-          ("redirect|connect|reach|listen",), at=("azure_redirect_uri",)),
+          ("redirect|connect|reach|listen",), at=("azure_redirect_uri",), grade=EITHER),
     Fault("redirect URI without a scheme", registered("device.example.net/webman/login.cgi"),
           "^device.example.net", ("https|scheme",), at=("azure_redirect_uri",), do=("https://",)),
     Fault("redirect URI with localhost", registered("https://localhost/webman/login.cgi"),
