@@ -158,7 +158,8 @@ void Inspect(CURL* handle, WebAnswer& answer) {
   curl_off_t microseconds = 0;
   curl_easy_getinfo(handle, CURLINFO_TOTAL_TIME_T, &microseconds);
   answer.milliseconds = static_cast<long>(microseconds / 1000);
-  answer.connected = Happened(handle, CURLINFO_CONNECT_TIME_T);
+  // Not the time to connect: some libcurls set it only when the TLS handshake is done too.
+  answer.connected = !answer.address.empty();
   answer.encrypted = Happened(handle, CURLINFO_APPCONNECT_TIME_T);
   answer.location = Text(handle, CURLINFO_REDIRECT_URL);
   answer.type = Text(handle, CURLINFO_CONTENT_TYPE);
@@ -214,7 +215,7 @@ WebAnswer Fetch(const std::string& url, const std::string* body, int seconds, bo
   answer.received = time(nullptr);
   answer.detail = error[0] != '\0' ? error : curl_easy_strerror(answer.code);
   Inspect(handle, answer);
-  if (!answer.connected && answer.address.empty() && (lenient || ProxyFor(url).empty())) {
+  if (!answer.connected && (lenient || ProxyFor(url).empty())) {
     answer.address = AddressesOf(transfer.host);
   }
   return answer;
