@@ -337,7 +337,7 @@ const KnownCrash kKnownCrashes[] = {
     {SIGSEGV,
      ", libcrypto.so.3 CRYPTO_THREAD_read_lock, libcrypto.so.3 ?, libcrypto.so.3 "
      "RAND_get0_primary",
-     "OpenSSL locks a part of its own context that it could not make", true, 98},
+     "OpenSSL locks a part of its context that it could not make", true, 98},
     {SIGABRT, ", libcurl.so.4 ?, libcurl.so.4 ?, libcurl.so.4 ?, libcurl.so.4 curl_easy_cleanup",
      "libcurl frees a TLS session twice that it could not remember", false, 14},
     {SIGPROF, ", libcurl.so.4 curl_easy_perform",
