@@ -1,7 +1,7 @@
 """Values of the settings: identifiers, secrets, endpoints, redirect URI."""
 
-from place import (CALLBACK, CLIENT, ENTRA_URL, LIBERTY_SECRET, OTHER_TENANT, RELAY, SECRET, SECRET_ID,
-                   TENANT)
+from place import (CALLBACK, CLIENT, ENTRA_URL, LIBERTY_SECRET, OTHER_TENANT, RELAY, SECRET,
+                   SECRET_ID, TENANT)
 from row import EITHER, WARNING, Fault, all_of, put, twin
 
 TRY = ("--try-secret",)
@@ -103,8 +103,8 @@ FAULTS = [
     Fault("public client at the provider", twin(public_client=True), "AADSTS700025", ("public",),
           do=("public|web|platform|azure_client_secret|registration",), run=TRY),
     Fault("secret wrong at Liberty", put(client_secret=LIBERTY_SECRET[::-1]),
-          "we cannot find key 'id_token'", ("secret",), at=("websphere_client_secret",), run=TRY,
-          base="liberty"),
+          "we cannot find key 'id_token'", ("secret|credential",), at=("websphere_client_secret",),
+          run=TRY, base="liberty"),
     Fault("Liberty's encoded secret copied", put(client_secret="{xor}CDo9Hg8sLTs8PTY4PjoxPTAzKj4="),
           "we cannot find key 'id_token'", ("secret|credential",), at=("websphere_client_secret",),
           run=TRY, base="liberty"),
@@ -133,7 +133,7 @@ FAULTS = [
     Fault("token endpoint without https://", put(token_endpoint=other("https://", "")),
           "parse json falied", ("https|scheme",), at=AT_TOKEN, do=("https://",)),
     Fault("token endpoint with http", put(token_endpoint=other("https:", "http:")),
-          "parse json falied", ("http",), at=AT_TOKEN, do=("https",), grade=EITHER),
+          "parse json falied", ("http|port 80",), at=AT_TOKEN, do=("https",), grade=EITHER),
     Fault("host misspelt", put(token_endpoint=other("login.", "logn.")), "resolve",
           ("name|host|resolve",), at=("azure_token_endpoint|logn.example.net",)),
     Fault("authorization endpoint's host misspelt",
